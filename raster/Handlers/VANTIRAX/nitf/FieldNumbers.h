@@ -1,0 +1,10 @@
+// Fixed-width decimal text fields of NITF headers converted to numbers, the
+// way atol/atof read them: leading blanks and a sign accepted, conversion
+// stops at the first character that cannot continue the number, no number
+// gives 0. Reading never passes `width` characters or a NUL.
+#pragma once
+
+#include <cstdint>
+
+int32_t FieldToLong(const char* text, unsigned width);   // width >= 16 gives 0
+double FieldToDouble(const char* text, unsigned width);  // width >= 32 gives 0.0
