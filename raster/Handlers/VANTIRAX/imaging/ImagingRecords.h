@@ -1,0 +1,73 @@
+// The records the imaging library exchanges with its callers, and the
+// signatures of its ten entry points. The library is in two modules: the
+// bitmap kernel (bitmap records and row spans) and the file loader (JPEG
+// streams and TIFF-wrapped CCITT T.4 strips decoded into bitmaps).
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+constexpr int kLoadSucceeded = 1;
+constexpr int kLoadFailed = 0;
+
+// A bitmap: 1-bit (packed, most significant bit first, a set bit is black),
+// 8-bit grey or 24-bit R,G,B pixels, rows stored top to bottom.
+struct BITMAPHANDLE {
+    uint32_t structSize;
+    uint32_t width;
+    uint32_t height;
+    uint32_t bitsPerPixel;
+    uint32_t bytesPerLine;
+    uint32_t accessCount;   // L_AccessBitmap / L_ReleaseBitmap nesting
+    uint8_t* pixels;        // bytesPerLine * height bytes, or null
+};
+
+// Load options: limits on the bitmap that a load may allocate.
+struct LOADFILEOPTION {
+    uint32_t structSize;
+    uint32_t maxWidth;      // the widest bitmap a load accepts, in pixels
+    uint32_t maxHeight;
+    uint64_t maxBytes;      // the largest pixel store a load may allocate
+};
+
+// What a load found in the stream.
+struct FILEINFO {
+    uint32_t structSize;
+    uint32_t width;
+    uint32_t height;
+    uint32_t bitsPerPixel;
+    uint32_t colorConverted;    // 1: the three components were delivered as R,G,B
+    uint32_t reserved;          // cleared by the caller before every load
+};
+
+// Load flags. The JPEG loads pass kLoadFlagsJpeg, with kLoadFlagRgbStream
+// added when the NITF APP6 segment says the components are coded as R,G,B
+// (no colour transform); the bi-level load passes kLoadFlagsBiLevel.
+constexpr uint32_t kLoadFlagsJpeg = 11;
+constexpr uint32_t kLoadFlagRgbStream = 4;
+constexpr uint32_t kLoadFlagsBiLevel = 67;
+constexpr int kOrderRgb = 3;        // three-byte pixels as R,G,B
+constexpr int kOrderAsStored = 0;
+constexpr int kBitsAsStored = 0;
+
+using LoadProgress = int (*)(void* userData);   // never used: loads run to completion
+
+using L_InitBitmapFunction = int (*)(BITMAPHANDLE* bitmap, uint32_t structSize, uint32_t width, uint32_t height,
+                                     uint32_t bitsPerPixel);
+using L_AllocateBitmapFunction = int (*)(BITMAPHANDLE* bitmap, int memoryKind);
+using L_FreeBitmapFunction = int (*)(BITMAPHANDLE* bitmap);
+using L_AccessBitmapFunction = int (*)(BITMAPHANDLE* bitmap);
+using L_GetBitmapRowColFunction = int64_t (*)(BITMAPHANDLE* bitmap, uint8_t* destination, uint32_t row,
+                                              uint32_t column, uint32_t byteCount);
+using L_ReleaseBitmapFunction = int (*)(BITMAPHANDLE* bitmap);
+using L_GetDefaultLoadFileOptionFunction = int (*)(LOADFILEOPTION* options, uint32_t structSize);
+using L_LoadFileOffsetFunction = int (*)(int fileHandle, uint64_t offset, uint32_t byteCount, BITMAPHANDLE* bitmap,
+                                         uint32_t structSize, int bitsPerPixel, int order, uint32_t flags,
+                                         LoadProgress progress, void* userData, const LOADFILEOPTION* options,
+                                         FILEINFO* info);
+using L_LoadMemoryFunction = int (*)(const uint8_t* buffer, BITMAPHANDLE* bitmap, uint32_t structSize,
+                                     int bitsPerPixel, int order, uint32_t flags, LoadProgress progress,
+                                     void* userData, uint32_t bufferSize, const LOADFILEOPTION* options,
+                                     FILEINFO* info);
+using L_LoadBitmapMemoryFunction = int (*)(const uint8_t* buffer, BITMAPHANDLE* bitmap, uint32_t structSize,
+                                           int bitsPerPixel, int order, uint32_t bufferSize);

@@ -1,0 +1,78 @@
+// CLeadToolLibWrapper: decodes the compressed image data of one NITF image
+// segment into bitmaps held in memory, and hands out row spans of them.
+//  - JPEG (IC "C3", "C5", "I1"): one JPEG stream per block, in block order,
+//    led by the NITF APP6 segment. A stream that leaves out its DQT or DHT
+//    gets the NITF defaults, chosen by the APP6 quality byte.
+//  - Bi-level (IC "C1"): one CCITT T.4 strip for the whole image, decoded
+//    after wrapping it in a fixed TIFF header.
+// The three texts of kDecoderErrorTexts are thrown as std::runtime_error;
+// every other failure is a false result.
+#pragma once
+
+#include "imaging/ImagingRecords.h"
+#include "plugin/FileReader.h"
+
+#include <cstdint>
+
+constexpr unsigned kApp6Size = 27;          // the NITF APP6 segment from its marker on
+constexpr unsigned kTiffHeaderSize = 424;   // the bi-level TIFF wrapper; the strip follows it
+
+enum DecoderKind : int32_t { kNotPrepared = -1, kJpegDecoder = 0, kBiLevelDecoder = 1 };
+
+extern const char* const kReinitialisedText;
+extern const char* const kDamagedImageText;
+extern const char* const kOutOfMemoryText;
+
+class CLeadToolLibWrapper {
+public:
+    int32_t kind = kNotPrepared;
+    BITMAPHANDLE** bitmaps = nullptr;   // bitmapCount owned records, or null
+    uint32_t bitmapCount = 0;
+    uint32_t bitsPerPixel = 0;          // NBPP
+    uint32_t bandCount = 0;             // NBANDS
+    uint8_t loaderConverted = 0;        // the loader delivered the last block's colours as R,G,B
+    uint8_t app6[kApp6Size] = {};       // 2-byte fields at 0, 2, 12, 14 in host order
+    uint8_t tiffHeader[kTiffHeaderSize];
+
+    CLeadToolLibWrapper();
+    ~CLeadToolLibWrapper();
+    CLeadToolLibWrapper(const CLeadToolLibWrapper&) = delete;
+    CLeadToolLibWrapper& operator=(const CLeadToolLibWrapper&) = delete;
+
+    // Binds the imaging library; when bound the decoder becomes a bi-level decoder.
+    bool PrepareBiLevel();
+    // The data must begin with SOI and the NITF APP6 segment; NBPP 12 and 16 are refused.
+    bool PrepareJpeg(CFileReader& reader, uint32_t dataOffset, uint32_t LI, uint32_t NBPP);
+    // Decodes every block. blockWidth and blockHeight (NPPBH, NPPBV) bound the
+    // size a block's stream may declare; 0 means not known, and the bound is
+    // then the largest block NITF allows for an image of NCOLS x NROWS.
+    bool Open(CFileReader& reader, uint32_t dataOffset, uint32_t blockCount, uint32_t LI, uint32_t NBPP,
+              uint32_t NBANDS, uint32_t NCOLS, uint32_t NROWS, bool oneDimensional,
+              uint32_t blockWidth = 0, uint32_t blockHeight = 0);
+    // Copies byteCount bytes of row `row` of block `block`, from column
+    // firstColumn on, to destination. Bi-level rows come out one byte per
+    // pixel (black 0, white 255) for lastColumn - firstColumn + 1 pixels.
+    bool GetRow(uint32_t block, uint32_t row, uint32_t firstColumn, uint32_t lastColumn, uint32_t byteCount,
+                uint8_t* destination);
+    void FreeBitmaps();
+
+    bool ReadNitfApp6(CFileReader& reader, uint32_t dataOffset);
+    // length runs from start to the end of the first FF D9 (EOI) after it.
+    bool FindEndOfImage(CFileReader& reader, uint32_t start, uint32_t& length);
+    // Notes DHT and DQT segments before the frame header or scan; the
+    // insertion point is the distance from start of the marker that ends the scan.
+    bool ScanTableMarkers(CFileReader& reader, uint32_t start, bool& hasDht, bool& hasDqt,
+                          uint32_t& insertionPoint);
+    bool openJPEGBitmap(CFileReader& reader, uint32_t dataOffset);
+    bool openBiLevelBitmap(CFileReader& reader, uint32_t dataOffset, uint32_t LI, uint32_t NCOLS, uint32_t NROWS,
+                           bool oneDimensional);
+
+    uint8_t quality() const { return app6[kApp6QualityOffset]; }
+    uint8_t streamColor() const { return app6[kApp6StreamColorOffset]; }
+
+private:
+    static constexpr unsigned kApp6QualityOffset = 20;
+    static constexpr unsigned kApp6StreamColorOffset = 21;
+    uint32_t blockWidthLimit = 0;
+    uint32_t blockHeightLimit = 0;
+};
