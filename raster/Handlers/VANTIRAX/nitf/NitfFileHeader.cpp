@@ -1,0 +1,198 @@
+#include "nitf/NitfFileHeader.h"
+
+#include "nitf/FieldNumbers.h"
+#include "plugin/FileReader.h"
+
+#include <cstring>
+#include <new>
+#include <strings.h>
+
+namespace {
+
+constexpr uint32_t kFixedLengthOffset = 342;   // FL in NITF 2.1 and NITF 2.0 without FSDEVT
+constexpr uint32_t kShiftedLengthOffset = 382; // FL in NITF 2.0 whose FSDWNG is 999998
+constexpr unsigned kVersionTextSize = 9;       // FHDR "NITF" + FVER "02.x0"
+constexpr unsigned kFileLengthWidth = 12;
+constexpr unsigned kHeaderLengthWidth = 6;
+constexpr unsigned kCountWidth = 3;
+constexpr unsigned kDataLengthWidth = 5;       // UDHDL, XHDL
+constexpr unsigned kOverflowWidth = 3;         // UDHOFL, XHDLOFL
+// Offsets are passed to 32-bit seeks; larger files are not read.
+constexpr uint64_t kLargestFile = 0x7FFFFFFF;
+// The length of the RPFHDR user-defined data: UDHOFL, tag, length and 48 bytes of header.
+constexpr int32_t kRpfUserHeaderLength = 62;
+constexpr char kRpfHeaderTag[] = "RPFHDR";
+
+struct SegmentGroupLayout {
+    unsigned subheaderWidth;
+    unsigned dataWidth;
+};
+
+// Reads width characters and converts them; false on a short read.
+bool ReadNumber(CFileReader& reader, unsigned width, int32_t& value)
+{
+    char field[16] = {};
+    reader.ReadBytes(field, width);
+    if (reader.Failed())
+        return false;
+    value = FieldToLong(field, width);
+    return true;
+}
+
+// Reads a 12-digit FL wide enough for any file size.
+bool ReadFileLengths(CFileReader& reader, char* lengthText, uint64_t& fileLength, uint32_t& headerLength)
+{
+    reader.ReadBytes(lengthText, kFileLengthWidth + kHeaderLengthWidth);
+    if (reader.Failed())
+        return false;
+    fileLength = 0;
+    for (unsigned i = 0; i < kFileLengthWidth; ++i) {
+        char digit = lengthText[i];
+        if (digit < '0' || digit > '9')
+            return false;
+        fileLength = fileLength * 10 + static_cast<uint64_t>(digit - '0');
+    }
+    int32_t declaredHeaderLength = FieldToLong(lengthText + kFileLengthWidth, kHeaderLengthWidth);
+    headerLength = declaredHeaderLength > 0 ? static_cast<uint32_t>(declaredHeaderLength) : 0;
+    return true;
+}
+
+// Reads one count field and its length pairs; a count of 0 leaves the list null.
+bool ReadSegmentGroup(CFileReader& reader, SegmentGroupLayout layout, int32_t& count, NitfSegmentLength*& list)
+{
+    if (!ReadNumber(reader, kCountWidth, count) || count < 0)
+        return false;
+    if (count == 0)
+        return true;
+    list = new NitfSegmentLength[static_cast<size_t>(count)];
+    for (int32_t i = 0; i < count; ++i) {
+        int32_t subheaderLength = 0;
+        int32_t dataLength = 0;
+        if (!ReadNumber(reader, layout.subheaderWidth, subheaderLength) ||
+            !ReadNumber(reader, layout.dataWidth, dataLength) || subheaderLength < 0 || dataLength < 0)
+            return false;
+        list[i] = {static_cast<uint32_t>(subheaderLength), static_cast<uint32_t>(dataLength)};
+    }
+    return true;
+}
+
+// Reads UDHDL/XHDL with its overflow field and data. The length counts the
+// 3-character overflow field, so 1 and 2 cannot be right; data running past
+// the end of the file is refused before anything is allocated.
+bool ReadHeaderData(CFileReader& reader, uint64_t fileSize, int32_t& length, int32_t& overflow, uint8_t*& data)
+{
+    if (!ReadNumber(reader, kDataLengthWidth, length) || length < 0)
+        return false;
+    if (length == 0)
+        return true;
+    if (length < static_cast<int32_t>(kOverflowWidth) ||
+        static_cast<uint64_t>(reader.position) + static_cast<uint64_t>(length) > fileSize)
+        return false;
+    if (!ReadNumber(reader, kOverflowWidth, overflow))
+        return false;
+    uint32_t dataLength = static_cast<uint32_t>(length) - kOverflowWidth;
+    data = new uint8_t[dataLength > 0 ? dataLength : 1];
+    reader.ReadBytes(data, dataLength);
+    return !reader.Failed();
+}
+
+} // namespace
+
+void CNitfFileHeader::SetPath(const char* filePath)
+{
+    delete[] path;
+    path = nullptr;
+    if (filePath == nullptr)
+        return;
+    size_t length = std::strlen(filePath);
+    path = new char[length + 1];
+    std::memcpy(path, filePath, length + 1);
+}
+
+bool CNitfFileHeader::Parse()
+{
+    try {
+        if (path == nullptr)
+            return false;
+        CFileReader reader(0);
+        reader.OpenFile(path, kShareDenyWrite);
+        if (!reader.HoldsFile())
+            return false;
+        uint64_t fileSize = reader.FileSize();
+        if (fileSize > kLargestFile)
+            return false;
+
+        reader.ReadBytes(headerText, kVersionTextSize);
+        if (reader.Failed() || std::memcmp(headerText, "NITF02", 6) != 0)
+            return false;
+        if (std::memcmp(headerText + 7, "10", 2) == 0)
+            version21 = 1;
+        else if (std::memcmp(headerText + 7, "00", 2) == 0)
+            version21 = 0;
+        else
+            return false;
+
+        uint64_t declaredLength = 0;
+        reader.SeekTo(kFixedLengthOffset, kSeekSet);
+        if (!ReadFileLengths(reader, lengthText, declaredLength, HL))
+            return false;
+        fixedLayout = 1;
+        if (declaredLength != fileSize) {
+            reader.SeekTo(kShiftedLengthOffset, kSeekSet);
+            if (!ReadFileLengths(reader, lengthText, declaredLength, HL) || declaredLength != fileSize)
+                return false;
+            fixedLayout = 0;
+        }
+        FL = static_cast<uint32_t>(declaredLength);
+
+        if (!ReadSegmentGroup(reader, {6, 10}, NUMI, imageSegments) ||
+            !ReadSegmentGroup(reader, {4, 6}, NUMS, graphicSegments) ||
+            !ReadSegmentGroup(reader, {4, 3}, NUML, labelSegments) ||
+            !ReadSegmentGroup(reader, {4, 5}, NUMT, textSegments) ||
+            !ReadSegmentGroup(reader, {4, 9}, NUMDES, desSegments) ||
+            !ReadSegmentGroup(reader, {4, 7}, NUMRES, resSegments))
+            return false;
+
+        userHeaderOffset = reader.position + kDataLengthWidth;
+        if (!ReadHeaderData(reader, fileSize, UDHDL, UDHOFL, UDHD))
+            return false;
+        if (UDHDL == 0)
+            userHeaderOffset = kNoUserHeader;
+        if (!ReadHeaderData(reader, fileSize, XHDL, XHDLOFL, XHD))
+            return false;
+
+        // HL is where the first image subheader begins: not inside this header, not past the file.
+        return HL >= reader.position && HL <= fileSize;
+    } catch (...) {
+        return false;
+    }
+}
+
+void CNitfFileHeader::Release()
+{
+    delete[] XHD;
+    XHD = nullptr;
+    delete[] UDHD;
+    UDHD = nullptr;
+    delete[] resSegments;
+    resSegments = nullptr;
+    delete[] desSegments;
+    desSegments = nullptr;
+    delete[] textSegments;
+    textSegments = nullptr;
+    delete[] labelSegments;
+    labelSegments = nullptr;
+    delete[] graphicSegments;
+    graphicSegments = nullptr;
+    delete[] imageSegments;
+    imageSegments = nullptr;
+    delete[] path;
+    path = nullptr;
+}
+
+bool CNitfFileHeader::HasRpfHeader() const
+{
+    const size_t tagLength = sizeof kRpfHeaderTag - 1;
+    return UDHDL == kRpfUserHeaderLength && UDHD != nullptr &&
+           strncasecmp(reinterpret_cast<const char*>(UDHD), kRpfHeaderTag, tagLength) == 0;
+}
