@@ -39,7 +39,8 @@ bool ReadNumber(CFileReader& reader, unsigned width, int32_t& value)
     return true;
 }
 
-// Reads a 12-digit FL wide enough for any file size.
+// Reads FL (12 digits, wide enough for any file size) and HL at the
+// reader's position. False on a short read or an FL that is not all digits.
 bool ReadFileLengths(CFileReader& reader, char* lengthText, uint64_t& fileLength, uint32_t& headerLength)
 {
     reader.ReadBytes(lengthText, kFileLengthWidth + kHeaderLengthWidth);
@@ -55,6 +56,15 @@ bool ReadFileLengths(CFileReader& reader, char* lengthText, uint64_t& fileLength
     int32_t declaredHeaderLength = FieldToLong(lengthText + kFileLengthWidth, kHeaderLengthWidth);
     headerLength = declaredHeaderLength > 0 ? static_cast<uint32_t>(declaredHeaderLength) : 0;
     return true;
+}
+
+// True when the FL found at offset matches the file's size.
+bool FileLengthMatchesAt(CFileReader& reader, uint32_t offset, uint64_t fileSize, char* lengthText,
+                         uint32_t& headerLength)
+{
+    uint64_t declaredLength = 0;
+    reader.SeekTo(static_cast<int32_t>(offset), kSeekSet);
+    return ReadFileLengths(reader, lengthText, declaredLength, headerLength) && declaredLength == fileSize;
 }
 
 // Reads one count field and its length pairs; a count of 0 leaves the list null.
@@ -132,18 +142,16 @@ bool CNitfFileHeader::Parse()
         else
             return false;
 
-        uint64_t declaredLength = 0;
-        reader.SeekTo(kFixedLengthOffset, kSeekSet);
-        if (!ReadFileLengths(reader, lengthText, declaredLength, HL))
-            return false;
-        fixedLayout = 1;
-        if (declaredLength != fileSize) {
-            reader.SeekTo(kShiftedLengthOffset, kSeekSet);
-            if (!ReadFileLengths(reader, lengthText, declaredLength, HL) || declaredLength != fileSize)
+        // FL sits at 342 unless a NITF 2.0 FSDEVT moved it to 382; a file whose
+        // FL matches its size at neither place was truncated or is not NITF.
+        if (FileLengthMatchesAt(reader, kFixedLengthOffset, fileSize, lengthText, HL)) {
+            fixedLayout = 1;
+        } else {
+            if (reader.Failed() || !FileLengthMatchesAt(reader, kShiftedLengthOffset, fileSize, lengthText, HL))
                 return false;
             fixedLayout = 0;
         }
-        FL = static_cast<uint32_t>(declaredLength);
+        FL = static_cast<uint32_t>(fileSize);
 
         if (!ReadSegmentGroup(reader, {6, 10}, NUMI, imageSegments) ||
             !ReadSegmentGroup(reader, {4, 6}, NUMS, graphicSegments) ||
