@@ -1,0 +1,95 @@
+#include "rpf/RpfFrameReader.h"
+
+#include <cstring>
+
+bool CRpfFrameReader::Open(CFileReader& reader, uint32_t headerSectionOffset)
+{
+    if (!headerSection.ReadHeaderSection(reader, headerSectionOffset))
+        return false;
+    bool bigEndian = headerSection.bigEndian;
+    if (!locationSection.ReadLocationSection(reader, headerSection.locationSectionLocation, bigEndian) ||
+        !coverage.ReadCoverage(reader, FindComponentLocation(kCoverageSectionSubheader), bigEndian))
+        return false;
+    if (!compressionSection.ReadCompressionSection(reader, FindComponentLocation(kCompressionSectionSubheader),
+                                                   FindComponentLocation(kCompressionLookupSubsection),
+                                                   FindComponentLocation(kCompressionParameterSubsection),
+                                                   bigEndian))
+        return false;
+    if (!colorGraySection.ReadColorGraySection(reader, FindComponentLocation(kColorGraySectionSubheader),
+                                               FindComponentLocation(kColormapSubsection),
+                                               FindComponentLocation(kColorConverterSubsection), bigEndian))
+        return false;
+    return imageSection.ReadImageSection(reader, FindComponentLocation(kImageDescriptionSubheader),
+                                         FindComponentLocation(kMaskSubsection),
+                                         FindComponentLocation(kImageDisplayParametersSubheader),
+                                         FindComponentLocation(kSpatialDataSubsection), bigEndian);
+}
+
+uint32_t CRpfFrameReader::FindComponentLocation(uint16_t componentId) const
+{
+    return locationSection.FindComponentLocation(componentId);
+}
+
+void CRpfFrameReader::PrepareDraw(uint32_t width)
+{
+    // A span of width columns touches at most width / kernel width + 2 codes.
+    codeCapacity = width / imageSection.kernelWidth + 2;
+    codeBuffer.assign(codeCapacity, 0);
+    codesHeld = false;
+}
+
+void CRpfFrameReader::ReleaseCodeBuffer()
+{
+    codeBuffer = std::vector<uint16_t>();
+    codeCapacity = 0;
+    codesHeld = false;
+}
+
+bool CRpfFrameReader::FetchCodes(CFileReader& reader, uint32_t imageRow, uint32_t firstColumn, uint32_t lastColumn)
+{
+    // Subframes are whole kernels high (checked at open), so rows with the
+    // same quotient share one code row of every subframe.
+    uint32_t codeRow = imageRow / imageSection.kernelHeight;
+    if (codesHeld && codeRow == heldCodeRow && firstColumn == heldFirstColumn && lastColumn == heldLastColumn)
+        return true;
+    codesHeld = imageSection.ReadCodeRow(reader, imageRow, firstColumn, lastColumn, codeCapacity,
+                                         codeBuffer.empty() ? nullptr : codeBuffer.data());
+    heldCodeRow = codeRow;
+    heldFirstColumn = firstColumn;
+    heldLastColumn = lastColumn;
+    return codesHeld;
+}
+
+bool CRpfFrameReader::ReadLine(CFileReader& reader, uint32_t imageRow, uint32_t firstColumn, uint32_t lastColumn,
+                               uint8_t* output)
+{
+    if (output == nullptr || lastColumn < firstColumn || !FetchCodes(reader, imageRow, firstColumn, lastColumn))
+        return false;
+    return AssembleLine(imageRow, firstColumn, lastColumn, output);
+}
+
+bool CRpfFrameReader::AssembleLine(uint32_t imageRow, uint32_t firstColumn, uint32_t lastColumn, uint8_t* output)
+{
+    uint16_t kernelWidth = imageSection.kernelWidth;
+    uint16_t kernelRow = static_cast<uint16_t>(imageRow % imageSection.kernelHeight);
+    uint32_t firstOffset = firstColumn % kernelWidth; // column of the span's first pixel inside its code
+    uint32_t span = lastColumn - firstColumn + 1;
+    uint64_t codesNeeded = (uint64_t(firstOffset) + span - 1) / kernelWidth + 1;
+    if (codesNeeded > codeCapacity)
+        return false;
+    if (kernelRowBuffer.empty())
+        kernelRowBuffer.assign(kernelWidth, 0);
+    uint8_t* kernel = kernelRowBuffer.data();
+    uint32_t written = 0;
+    for (uint32_t codeIndex = 0; written < span; ++codeIndex) {
+        if (!compressionSection.DecodeKernelRow(kernelRow, codeBuffer[codeIndex], kernelWidth, kernel))
+            return false;
+        uint32_t from = codeIndex == 0 ? firstOffset : 0;
+        uint32_t count = kernelWidth - from;
+        if (count > span - written)
+            count = span - written;
+        std::memcpy(output + written, kernel + from, count);
+        written += count;
+    }
+    return true;
+}

@@ -1,0 +1,211 @@
+#include "rpf/RpfImageSection.h"
+
+#include "rpf/RpfFieldReader.h"
+
+#include <algorithm>
+
+namespace {
+
+constexpr uint32_t kNoMaskTable = 0xFFFFFFFF;
+constexpr uint64_t kMaskedSubframeStart = 0xFFFFFFFF;
+constexpr uint8_t kCodeBits = 12; // the only code length of CADRG and CIB frames
+constexpr uint16_t kMaskedCode = 0xFFFF;
+
+} // namespace
+
+bool RpfImageSection::ReadImageSection(CFileReader& reader, uint32_t descriptionLocation, uint32_t maskLocation,
+                                       uint32_t displayLocation, uint32_t spatialLocation, bool bigEndian)
+{
+    spatialDataLocation = spatialLocation;
+    fileSize = reader.FileSize();
+    if (!ReadDescription(reader, descriptionLocation, bigEndian))
+        return false;
+    if (maskLocation != 0 && !ReadMaskHeader(reader, maskLocation, bigEndian))
+        return false;
+    if (!ReadDisplayParameters(reader, displayLocation, bigEndian) || !DeriveGeometry())
+        return false;
+    if (subframeMaskTableOffset != kNoMaskTable &&
+        !ReadMaskTable(reader, maskLocation, subframeMaskTableOffset, bigEndian, subframeMaskTable))
+        return false;
+    return transparencyMaskTableOffset == kNoMaskTable ||
+           ReadMaskTable(reader, maskLocation, transparencyMaskTableOffset, bigEndian, transparencyMaskTable);
+}
+
+bool RpfImageSection::ReadDescription(CFileReader& reader, uint32_t location, bool bigEndian)
+{
+    if (!SeekToLocation(reader, location))
+        return false;
+    ReadNumber(reader, spectralGroupCount, bigEndian);
+    ReadNumber(reader, subframeTableCount, bigEndian);
+    ReadNumber(reader, spectralBandTableCount, bigEndian);
+    ReadNumber(reader, spectralBandLinesPerImageRow, bigEndian);
+    ReadNumber(reader, subframesEastWest, bigEndian);
+    ReadNumber(reader, subframesNorthSouth, bigEndian);
+    ReadNumber(reader, outputColumnsPerSubframe, bigEndian);
+    ReadNumber(reader, outputRowsPerSubframe, bigEndian);
+    ReadNumber(reader, subframeMaskTableOffset, bigEndian);
+    ReadNumber(reader, transparencyMaskTableOffset, bigEndian);
+    return !reader.Failed();
+}
+
+bool RpfImageSection::ReadMaskHeader(CFileReader& reader, uint32_t location, bool bigEndian)
+{
+    if (!SeekToLocation(reader, location))
+        return false;
+    ReadNumber(reader, subframeSequenceRecordLength, bigEndian);
+    ReadNumber(reader, transparencySequenceRecordLength, bigEndian);
+    ReadNumber(reader, transparentOutputPixelCodeLength, bigEndian);
+    return !reader.Failed();
+}
+
+bool RpfImageSection::ReadDisplayParameters(CFileReader& reader, uint32_t location, bool bigEndian)
+{
+    if (!SeekToLocation(reader, location))
+        return false;
+    ReadNumber(reader, imageRows, bigEndian);
+    ReadNumber(reader, imageCodesPerRow, bigEndian);
+    reader.ReadBytes(&imageCodeBitLength, 1);
+    return !reader.Failed();
+}
+
+// Refuses a geometry that cannot be decoded: no code grid, a kernel of zero
+// width or height, subframes that are not whole kernels, an image or code
+// row larger than can be addressed or than the file holds.
+bool RpfImageSection::DeriveGeometry()
+{
+    if (imageRows == 0 || imageCodesPerRow == 0)
+        return false;
+    uint32_t columnsPerCode = outputColumnsPerSubframe / imageCodesPerRow;
+    uint32_t rowsPerCode = outputRowsPerSubframe / imageRows;
+    if (columnsPerCode == 0 || rowsPerCode == 0 || columnsPerCode > UINT16_MAX || rowsPerCode > UINT16_MAX)
+        return false;
+    if (outputColumnsPerSubframe % imageCodesPerRow != 0 || outputRowsPerSubframe % imageRows != 0)
+        return false;
+    uint64_t columns = uint64_t(subframesEastWest) * outputColumnsPerSubframe;
+    uint64_t rows = uint64_t(subframesNorthSouth) * outputRowsPerSubframe;
+    uint64_t codeRowBytes = uint64_t(imageCodeBitLength) * imageCodesPerRow / 8;
+    uint64_t subframeBytes = uint64_t(imageCodeBitLength) * imageCodesPerRow * imageRows / 8;
+    if (columns > UINT32_MAX || rows > UINT32_MAX || codeRowBytes > fileSize || subframeBytes > UINT32_MAX)
+        return false;
+    kernelWidth = static_cast<uint16_t>(columnsPerCode);
+    kernelHeight = static_cast<uint16_t>(rowsPerCode);
+    totalColumns = static_cast<uint32_t>(columns);
+    totalRows = static_cast<uint32_t>(rows);
+    bytesPerCodeRow = static_cast<uint32_t>(codeRowBytes);
+    bytesPerSubframe = static_cast<uint32_t>(subframeBytes);
+    return true;
+}
+
+bool RpfImageSection::ReadMaskTable(CFileReader& reader, uint32_t maskLocation, uint32_t offset, bool bigEndian,
+                                    std::vector<uint32_t>& table)
+{
+    uint64_t subframeCount = uint64_t(subframesEastWest) * subframesNorthSouth;
+    uint64_t location = uint64_t(maskLocation) + offset;
+    if (!FitsInFile(location, subframeCount * sizeof(uint32_t), fileSize) || !SeekToLocation(reader, location))
+        return false;
+    table.assign(subframeCount, 0);
+    reader.ReadBytes(table.data(), static_cast<uint32_t>(subframeCount * sizeof(uint32_t)));
+    if (reader.Failed())
+        return false;
+    if (bigEndian)
+        for (uint32_t& entry : table)
+            ReverseBytes(entry);
+    return true;
+}
+
+// The file offset of a subframe's codes; false when the subframe is masked:
+// its table entry is 0xFFFFFFFF or the offset runs past 32 bits.
+bool RpfImageSection::SubframeStart(uint32_t subframe, uint64_t& start) const
+{
+    uint64_t offset = subframeMaskTable.empty() ? uint64_t(subframe) * bytesPerSubframe : subframeMaskTable[subframe];
+    start = uint64_t(spatialDataLocation) + offset;
+    return start < kMaskedSubframeStart;
+}
+
+bool RpfImageSection::ReadSubframeCodes(CFileReader& reader, uint32_t subframe, uint32_t codeRow,
+                                        uint32_t firstCode, uint32_t count, uint16_t* output)
+{
+    uint64_t start = 0;
+    if (!SubframeStart(subframe, start)) {
+        std::fill(output, output + count, kMaskedCode);
+        return true;
+    }
+    uint64_t rowStart = start + uint64_t(codeRow) * bytesPerCodeRow;
+    // Checked here rather than left to a short read, whose end-of-file flag
+    // would fail every later line of the draw.
+    if (!FitsInFile(rowStart, bytesPerCodeRow, fileSize) || rowStart > kMaxSeekOffset)
+        return false;
+    reader.SeekTo(static_cast<int32_t>(rowStart), kSeekSet);
+    reader.ReadBytes(rawCodeRow.data(), bytesPerCodeRow);
+    if (reader.Failed())
+        return false;
+    UnpackCodes(rawCodeRow.data(), bytesPerCodeRow, unpackedCodeRow.data(), imageCodesPerRow, imageCodeBitLength);
+    std::copy(unpackedCodeRow.begin() + firstCode, unpackedCodeRow.begin() + firstCode + count, output);
+    return true;
+}
+
+bool RpfImageSection::ReadCodeRow(CFileReader& reader, uint32_t imageRow, uint32_t firstColumn, uint32_t lastColumn,
+                                  uint32_t capacity, uint16_t* output)
+{
+    if (output == nullptr || !reader.HoldsFile() || imageRow >= totalRows || firstColumn >= totalColumns ||
+        lastColumn >= totalColumns || imageCodeBitLength != kCodeBits)
+        return false;
+    if (rawCodeRow.empty()) {
+        rawCodeRow.assign(bytesPerCodeRow, 0);
+        unpackedCodeRow.assign(imageCodesPerRow, 0);
+    }
+    uint32_t columnsPerSubframe = outputColumnsPerSubframe;
+    uint32_t subframeRow = imageRow / outputRowsPerSubframe;
+    uint32_t codeRow = (imageRow % outputRowsPerSubframe) / kernelHeight;
+    uint32_t firstSubframe = firstColumn / columnsPerSubframe + subframesEastWest * subframeRow;
+    uint32_t firstCode = (firstColumn % columnsPerSubframe) / kernelWidth;
+    uint32_t lastSubframe = lastColumn / columnsPerSubframe + subframesEastWest * subframeRow;
+    uint32_t lastCode = (lastColumn % columnsPerSubframe) / kernelWidth;
+    if (firstCode >= imageCodesPerRow || lastCode >= imageCodesPerRow)
+        return false;
+    if (firstSubframe == lastSubframe) {
+        if (firstCode > lastCode || capacity < lastCode - firstCode + 1)
+            return false;
+        uint64_t start = 0;
+        if (!SubframeStart(firstSubframe, start)) {
+            std::fill(output, output + capacity, kMaskedCode);
+            return true;
+        }
+        return ReadSubframeCodes(reader, firstSubframe, codeRow, firstCode, lastCode - firstCode + 1, output);
+    }
+    if (lastSubframe < firstSubframe)
+        return false;
+    uint64_t total = uint64_t(lastSubframe - firstSubframe - 1) * imageCodesPerRow + (lastCode + 1) +
+                     (imageCodesPerRow - firstCode);
+    if (capacity < total)
+        return false;
+    for (uint32_t subframe = firstSubframe; subframe <= lastSubframe; ++subframe) {
+        uint32_t startCode = subframe == firstSubframe ? firstCode : 0;
+        uint32_t count = subframe == lastSubframe ? lastCode + 1 : imageCodesPerRow - startCode;
+        if (!ReadSubframeCodes(reader, subframe, codeRow, startCode, count, output))
+            return false;
+        output += count;
+    }
+    return true;
+}
+
+bool UnpackCodes(const uint8_t* packed, uint32_t byteCount, uint16_t* codes, uint32_t codeCount,
+                 uint8_t codeBitLength)
+{
+    if (codeBitLength != kCodeBits)
+        return false;
+    // A code whose last bits lie past byteCount takes zero bits from there.
+    auto byteAt = [&](uint64_t index) -> uint16_t { return index < byteCount ? packed[index] : 0; };
+    uint64_t consumed = 0;
+    for (uint32_t index = 0; index < codeCount && consumed < byteCount; ++index) {
+        uint64_t first = uint64_t(index / 2) * 3;
+        if (index % 2 == 0) {
+            codes[index] = static_cast<uint16_t>((byteAt(first) << 4) | (byteAt(first + 1) >> 4));
+            consumed += 1;
+        } else {
+            codes[index] = static_cast<uint16_t>(((byteAt(first + 1) & 0x0F) << 8) | byteAt(first + 2));
+            consumed += 2;
+        }
+    }
+    return true;
+}
