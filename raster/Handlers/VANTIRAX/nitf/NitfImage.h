@@ -1,11 +1,144 @@
+// CNitfImage: the first image segment of a plain NITF file. It parses the
+// image subheader (both the NITF 2.0 and 2.1 layouts), decides whether the
+// image is one this library serves, describes its colours and delivers rows:
+// uncompressed images block by block from the file in any IMODE, compressed
+// ones from the embedded decoder.
 #pragma once
+
+#include "imaging/LeadToolLibWrapper.h"
+#include "nitf/NitfBand.h"
 #include "plugin/FileReader.h"
+
+#include <cstdint>
+#include <memory>
+#include <vector>
+
+class SubheaderCursor;
+
+template <typename T>
+void FreeVector(std::vector<T>& values)
+{
+    std::vector<T>().swap(values);
+}
+
+// compressionKind values, from the digit of IC ("I1" is 7).
+enum NitfCompressionKind : int32_t {
+    kUncompressed = 0,
+    kBiLevel = 1,
+    kArithmeticDpcm = 2,
+    kJpeg = 3,
+    kVectorQuantized = 4,
+    kLosslessJpeg = 5,
+    kDownsampledJpeg = 7,
+};
+
+constexpr uint32_t kBlockNotStored = 0xFFFFFFFF; // block record of a block the file leaves out
+constexpr unsigned kSubheaderFrontSize = 372;   // IM to ICORDS, NITF 2.1 positions
+constexpr unsigned kBlockingTextSize = 40;      // ISYNC to IMAG
+constexpr unsigned kIgeoloSize = 60;
+constexpr unsigned kCommentSize = 80;
+
 class CNitfImage {
 public:
-    uint16_t fixedLayout = 0;
+    uint32_t dataOffset = 0;        // first byte of (blocked) image data
+    int32_t NBPR = 0, NBPC = 0;
+    int32_t NPPBH = 0, NPPBV = 0;
+    int32_t NBPP = 0;
+    int32_t ABPP = 0;
+    int32_t bytesPerPixel = 0;      // NBPP / 8
+    std::vector<uint8_t> lineBuffer;
+    uint8_t isMono = 0;
+    uint8_t isRgb = 0;              // also set for "RGB/LUT"
+    int32_t compressionKind = kUncompressed;
+    uint8_t isMasked = 0;
+    std::vector<uint32_t> blockOffsets; // per block (per band and block in IMODE S), relative to dataOffset
+    uint16_t fixedLayout = 0;       // copied from the file header before parsing
     uint16_t version21 = 0;
-    uint32_t subheaderLength = 0;
-    bool ReadSubheader(CFileReader&, uint32_t) { return false; }
-    bool PrepareData(CFileReader&, uint32_t) { return false; }
-    void Release() {}
+    uint32_t subheaderLength = 0;   // LISH of the segment, set by the caller; 0 when not known
+    CLeadToolLibWrapper decoder;
+    char subheaderText[kSubheaderFrontSize] = {};
+    std::unique_ptr<char[]> IGEOLO; // 60 characters and a NUL, or null without corners
+    int32_t NICOM = 0;
+    std::vector<char> comments;     // NICOM x 80 characters, not terminated
+    char IC[2] = {};
+    char COMRAT[4] = {};
+    double comrat = 0;
+    int32_t NBANDS = 0;
+    std::vector<NitfBand> bands;
+    char blockingText[kBlockingTextSize] = {};
+    int32_t UDIDL = 0, UDOFL = 0;
+    std::vector<uint8_t> UDID;
+    int32_t IXSHDL = 0, IXSOFL = 0;
+    std::vector<uint8_t> IXSHD;
+    int32_t NCOLS = 0, NROWS = 0;
+
+    explicit CNitfImage(uint16_t initialFixedLayout = 0) : fixedLayout(initialFixedLayout) {}
+    CNitfImage(const CNitfImage&) = delete;
+    CNitfImage& operator=(const CNitfImage&) = delete;
+
+    // Parses the image subheader at offset. Image data is taken to start at
+    // offset + subheaderLength when that is known. False on any failure.
+    bool ReadSubheader(CFileReader& reader, uint32_t offset);
+    void Release();
+
+    // Whether the image is served; sets up the decoder for compressed kinds.
+    bool PrepareData(CFileReader& reader, uint32_t dataLength);
+    bool IsPaletted() const;
+    int32_t GetPaletteSize() const;
+    bool GetPaletteEntry(int32_t index, uint8_t& red, uint8_t& green, uint8_t& blue) const;
+    void AllocLineBuffer();
+    // Decodes a compressed image into the decoder; the decoder's error texts
+    // pass through as exceptions.
+    bool OpenCompressed(CFileReader& reader, uint32_t dataLength);
+    // One row, columns firstColumn..lastColumn inclusive, into out: one byte
+    // per pixel for one band, three for three bands.
+    bool ReadLine(CFileReader& reader, uint32_t row, int32_t firstColumn, int32_t lastColumn, uint8_t* out);
+    void ReleaseDecoder();
+
+    char ICORDS() const { return subheaderText[kIcordsPosition]; }
+    char IMODE() const { return blockingText[kImodePosition]; }
+    const char* IREP() const { return subheaderText + kIrepPosition; }
+    char PJUST() const { return subheaderText[kPjustPosition]; }
+
+private:
+    static constexpr unsigned kIcordsPosition = 371;
+    static constexpr unsigned kImodePosition = 1;
+    static constexpr unsigned kIrepPosition = 352;
+    static constexpr unsigned kPjustPosition = 370;
+
+    uint8_t isPrepared = 0;          // PrepareData accepted the image
+    uint64_t readLimit = 0;          // bytes of the file that reads may reach
+    uint32_t streamStart = 0;        // JPEG: the first stored block's stream
+    uint32_t storedBlockCount = 0;   // JPEG: streams the decoder holds
+    std::vector<uint32_t> streamIndex; // masked JPEG: decoder bitmap of each block
+
+    // Subheader steps.
+    bool ReadFront(SubheaderCursor& cursor, uint32_t offset);
+    bool ReadCorners(SubheaderCursor& cursor);
+    bool ReadCompression(SubheaderCursor& cursor);
+    bool ReadBands(SubheaderCursor& cursor);
+    bool ReadBlocking(SubheaderCursor& cursor);
+    bool ReadExtensions(SubheaderCursor& cursor);
+    bool PlaceData(SubheaderCursor& cursor, uint32_t offset);
+    bool ReadMaskTable(SubheaderCursor& cursor);
+    void ClearParsed();
+
+    // Data steps.
+    bool ValidGeometry();
+    bool ServesUncompressed() const;
+    bool DataFitsFile() const;
+    bool PrepareJpegData(CFileReader& reader, uint32_t dataLength);
+    bool IndexMaskedStreams();
+    uint64_t BandBlockBytes() const;
+
+    // Line steps.
+    uint32_t OutputPixelBytes() const;
+    bool ReadUncompressedBlock(CFileReader& reader, uint32_t block, uint32_t rowInBlock, uint32_t c0, uint32_t n,
+                               uint8_t* out);
+    bool ReadBandSpan(CFileReader& reader, uint64_t blockStart, int32_t band, uint32_t rowInBlock, uint32_t c0,
+                      uint32_t n, uint8_t* out);
+    bool ReadSpan(CFileReader& reader, uint64_t position, uint64_t count);
+    void ScatterBand(const uint8_t* source, uint32_t sourceStride, uint32_t n, int32_t band, uint8_t* out) const;
+    uint8_t ConvertPixel(const uint8_t* pixel) const;
+    bool ReadCompressedBlock(uint32_t block, uint32_t rowInBlock, uint32_t c0, uint32_t c1, uint8_t* out);
 };

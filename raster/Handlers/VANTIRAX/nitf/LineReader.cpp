@@ -1,0 +1,164 @@
+// ReadLine: one row of the image, assembled block by block. Uncompressed rows
+// are read from the file, only the bytes of the span in each band; compressed
+// rows come from the decoder's bitmaps.
+#include "nitf/NitfImage.h"
+
+#include <cstring>
+
+namespace {
+
+constexpr unsigned kByteBits = 8;
+
+} // namespace
+
+uint32_t CNitfImage::OutputPixelBytes() const
+{
+    if (compressionKind == kBiLevel)
+        return 1;
+    if (compressionKind == kUncompressed)
+        return uint32_t(NBANDS);
+    return uint32_t(NBPP) * uint32_t(NBANDS) / kByteBits;
+}
+
+bool CNitfImage::ReadLine(CFileReader& reader, uint32_t row, int32_t firstColumn, int32_t lastColumn, uint8_t* out)
+{
+    if (!isPrepared || out == nullptr || row >= uint32_t(NROWS) || firstColumn < 0 || lastColumn < firstColumn ||
+        lastColumn >= NCOLS)
+        return false;
+    const bool decoded = compressionKind != kUncompressed;
+    if (decoded && compressionKind != kBiLevel && compressionKind != kJpeg && compressionKind != kLosslessJpeg &&
+        compressionKind != kDownsampledJpeg)
+        return false;
+    const uint32_t blockWidth = uint32_t(NPPBH);
+    const uint32_t first = uint32_t(firstColumn), last = uint32_t(lastColumn);
+    const uint32_t blockRow = row / uint32_t(NPPBV), rowInBlock = row % uint32_t(NPPBV);
+    const uint32_t firstBlock = blockRow * uint32_t(NBPR) + first / blockWidth;
+    const uint32_t lastBlock = blockRow * uint32_t(NBPR) + last / blockWidth;
+    const uint32_t pixelBytes = OutputPixelBytes();
+    for (uint32_t b = firstBlock; b <= lastBlock; ++b) {
+        const uint32_t c0 = b == firstBlock ? first % blockWidth : 0;
+        const uint32_t c1 = b == lastBlock ? last % blockWidth : blockWidth - 1;
+        const uint32_t n = c1 - c0 + 1;
+        const bool ok = decoded ? ReadCompressedBlock(b, rowInBlock, c0, c1, out)
+                                : ReadUncompressedBlock(reader, b, rowInBlock, c0, n, out);
+        if (!ok)
+            return false;
+        out += size_t(n) * pixelBytes;
+    }
+    return true;
+}
+
+// Where a block (one band's block in IMODE "S") starts in the image data:
+// from the mask table, or counted from the block number.
+bool CNitfImage::ReadUncompressedBlock(CFileReader& reader, uint32_t block, uint32_t rowInBlock, uint32_t c0,
+                                       uint32_t n, uint8_t* out)
+{
+    const uint64_t blocks = uint64_t(NBPR) * uint64_t(NBPC);
+    const bool bandsApart = IMODE() == 'S';
+    if (IMODE() == 'P') {
+        // All bands of a pixel stand together: one read for the span.
+        if (isMasked && blockOffsets[block] == kBlockNotStored) {
+            std::memset(out, 0, size_t(n) * size_t(NBANDS));
+            return true;
+        }
+        const uint64_t blockStart = isMasked ? blockOffsets[block] : block * BandBlockBytes() * uint64_t(NBANDS);
+        const uint32_t pixelStride = uint32_t(NBANDS) * uint32_t(bytesPerPixel);
+        const uint64_t position = dataOffset + blockStart + (uint64_t(NPPBH) * rowInBlock + c0) * pixelStride;
+        if (!ReadSpan(reader, position, uint64_t(n) * pixelStride))
+            return false;
+        for (int32_t band = 0; band < NBANDS; ++band)
+            ScatterBand(lineBuffer.data() + size_t(band) * size_t(bytesPerPixel), pixelStride, n, band, out);
+        return true;
+    }
+    for (int32_t band = 0; band < NBANDS; ++band) {
+        uint64_t blockStart = 0;
+        if (isMasked) {
+            const uint32_t record = blockOffsets[bandsApart ? band * blocks + block : block];
+            if (record == kBlockNotStored) {
+                ScatterBand(nullptr, 0, n, band, out);
+                continue;
+            }
+            blockStart = record;
+        } else {
+            // In IMODE "S" each band's blocks follow all blocks of the band before.
+            blockStart = bandsApart ? (uint64_t(band) * blocks + block) * BandBlockBytes()
+                                    : uint64_t(block) * BandBlockBytes() * uint64_t(NBANDS);
+        }
+        if (!ReadBandSpan(reader, blockStart, band, rowInBlock, c0, n, out))
+            return false;
+    }
+    return true;
+}
+
+// Band `band` of the span in a block stored by block ("B"), by row ("R") or
+// band-sequentially ("S", where blockStart is already that band's block).
+bool CNitfImage::ReadBandSpan(CFileReader& reader, uint64_t blockStart, int32_t band, uint32_t rowInBlock,
+                              uint32_t c0, uint32_t n, uint8_t* out)
+{
+    const uint64_t pixelBytes = uint64_t(bytesPerPixel);
+    uint64_t pixelIndex = uint64_t(NPPBH) * rowInBlock + c0;
+    if (IMODE() == 'B')
+        pixelIndex += uint64_t(band) * uint64_t(NPPBH) * uint64_t(NPPBV);
+    else if (IMODE() == 'R')
+        pixelIndex += uint64_t(NPPBH) * (uint64_t(rowInBlock) * uint64_t(NBANDS - 1) + uint64_t(band));
+    if (!ReadSpan(reader, dataOffset + blockStart + pixelIndex * pixelBytes, n * pixelBytes))
+        return false;
+    ScatterBand(lineBuffer.data(), uint32_t(pixelBytes), n, band, out);
+    return true;
+}
+
+// One seek and one read into the line buffer; false when the bytes are not
+// all in the file (a short final block) or do not fit the buffer.
+bool CNitfImage::ReadSpan(CFileReader& reader, uint64_t position, uint64_t count)
+{
+    if (count > lineBuffer.size() || position > readLimit || count > readLimit - position)
+        return false;
+    reader.SeekTo(static_cast<int32_t>(position), kSeekSet);
+    if (reader.error == kSeekFailed || reader.position != position)
+        return false;
+    reader.ReadBytes(lineBuffer.data(), static_cast<uint32_t>(count));
+    return reader.error != kSeekFailed && reader.position - position == count;
+}
+
+// Writes byte `band` of n output pixels from source pixels sourceStride bytes
+// apart; a null source writes zeros (a block the file does not store).
+void CNitfImage::ScatterBand(const uint8_t* source, uint32_t sourceStride, uint32_t n, int32_t band,
+                             uint8_t* out) const
+{
+    const size_t outStride = size_t(NBANDS);
+    for (uint32_t i = 0; i < n; ++i)
+        out[i * outStride + size_t(band)] = source == nullptr ? 0 : ConvertPixel(source + size_t(i) * sourceStride);
+}
+
+// A pixel wider than 8 bits (most significant byte first) becomes the 8 most
+// significant of its ABPP significant bits. Right-justified pixels (PJUST
+// "R") hold them in the low bits; left-justified ones in the high bits.
+uint8_t CNitfImage::ConvertPixel(const uint8_t* pixel) const
+{
+    if (bytesPerPixel < 2)
+        return pixel[0];
+    uint64_t value = 0;
+    for (int32_t i = 0; i < bytesPerPixel; ++i)
+        value = (value << kByteBits) | pixel[i];
+    const int32_t significant = ABPP >= 1 && ABPP <= NBPP && PJUST() != 'L' ? ABPP : NBPP;
+    const uint64_t top = significant >= int32_t(kByteBits) ? value >> (significant - int32_t(kByteBits))
+                                                          : value << (int32_t(kByteBits) - significant);
+    return static_cast<uint8_t>(top & 0xFF);
+}
+
+// A compressed block's span, from the decoder: one bitmap per stored block
+// (a masked block that is not stored gives zeros).
+bool CNitfImage::ReadCompressedBlock(uint32_t block, uint32_t rowInBlock, uint32_t c0, uint32_t c1, uint8_t* out)
+{
+    const uint32_t n = c1 - c0 + 1;
+    uint32_t bitmap = block;
+    if (!streamIndex.empty()) {
+        bitmap = streamIndex[block];
+        if (bitmap == kBlockNotStored) {
+            std::memset(out, 0, size_t(n) * OutputPixelBytes());
+            return true;
+        }
+    }
+    const uint32_t byteCount = compressionKind == kBiLevel ? (n + kByteBits - 1) / kByteBits : n * OutputPixelBytes();
+    return decoder.GetRow(bitmap, rowInBlock, c0, c1, byteCount, out);
+}

@@ -1,0 +1,234 @@
+// CNitfImage: which images are served, their colours, and the set-up of the
+// decoder for compressed images.
+#include "nitf/NitfImage.h"
+
+#include <algorithm>
+#include <strings.h>
+
+namespace {
+
+constexpr unsigned kPvtypePosition = 349;
+constexpr int32_t kGreyPaletteSize = 256;
+constexpr int32_t kLastPaletteIndex = 255;
+constexpr unsigned kRgbTables = 3;
+constexpr unsigned kSmallestJpegStream = 4; // SOI and EOI markers
+
+// product *= factor, false when the product would pass limit.
+bool MultiplyWithin(uint64_t& product, uint64_t factor, uint64_t limit)
+{
+    if (factor != 0 && product > limit / factor)
+        return false;
+    product *= factor;
+    return product <= limit;
+}
+
+bool IsMonoDepth(int32_t NBPP)
+{
+    return NBPP == 8 || NBPP == 16 || NBPP == 32 || NBPP == 64;
+}
+
+} // namespace
+
+bool CNitfImage::IsPaletted() const
+{
+    return strncasecmp(IREP(), "RGB/LUT", 7) == 0 || isMono;
+}
+
+int32_t CNitfImage::GetPaletteSize() const
+{
+    if (isRgb && IsPaletted() && !bands.empty())
+        return bands[0].NELUT;
+    return kGreyPaletteSize;
+}
+
+// Entries whose table position lies past the lookup data are not answered
+// (false); the caller leaves them black.
+bool CNitfImage::GetPaletteEntry(int32_t index, uint8_t& red, uint8_t& green, uint8_t& blue) const
+{
+    if (index < 0 || index > kLastPaletteIndex || bands.empty())
+        return false;
+    const std::vector<uint8_t>& LUT = bands[0].LUT;
+    const size_t i = size_t(index);
+    if (isMono) {
+        const size_t position = bytesPerPixel < 2 ? i : i * size_t(bytesPerPixel);
+        if (LUT.empty()) {
+            red = green = blue = static_cast<uint8_t>(index);
+            return true;
+        }
+        if (position >= LUT.size())
+            return false;
+        red = green = blue = LUT[position];
+        return true;
+    }
+    const size_t NELUT = size_t(bands[0].NELUT);
+    if (LUT.empty() || (kRgbTables - 1) * NELUT + i >= LUT.size())
+        return false;
+    red = LUT[i];
+    green = LUT[NELUT + i];
+    blue = LUT[2 * NELUT + i];
+    return true;
+}
+
+bool CNitfImage::PrepareData(CFileReader& reader, uint32_t dataLength)
+{
+    isPrepared = 0;
+    FreeVector(streamIndex);
+    readLimit = std::min<uint64_t>(reader.FileSize(), uint64_t(INT32_MAX));
+    if (!ValidGeometry())
+        return false;
+    bool served = false;
+    switch (compressionKind) {
+    case kUncompressed:
+        served = ServesUncompressed() && DataFitsFile();
+        break;
+    case kBiLevel:
+        // The decoder wraps all LI bytes at once; one byte per pixel comes out.
+        served = NBANDS == 1 && dataLength != 0 && dataLength <= readLimit - dataOffset && decoder.PrepareBiLevel();
+        break;
+    case kJpeg:
+    case kLosslessJpeg:
+    case kDownsampledJpeg:
+        served = PrepareJpegData(reader, dataLength);
+        break;
+    case kVectorQuantized:
+        served = NBANDS == 1 && IsPaletted();
+        break;
+    default:
+        break;
+    }
+    isPrepared = served ? 1 : 0;
+    return served;
+}
+
+// The block geometry every row read relies on: blocks that cover the image,
+// no block size of 0 (NPPBH or NPPBV 0 with one block stands for the image's
+// width or height, as NITF writes it for large images), a known IMODE.
+bool CNitfImage::ValidGeometry()
+{
+    if (NCOLS < 1 || NROWS < 1 || NBPR < 1 || NBPC < 1 || NBPP < 1 || NBANDS < 1 || dataOffset > readLimit)
+        return false;
+    if (NPPBH == 0 && NBPR == 1)
+        NPPBH = NCOLS;
+    if (NPPBV == 0 && NBPC == 1)
+        NPPBV = NROWS;
+    if (NPPBH < 1 || NPPBV < 1)
+        return false;
+    if (int64_t(NBPR) * NPPBH < NCOLS || int64_t(NBPC) * NPPBV < NROWS)
+        return false;
+    const char mode = IMODE();
+    return mode == 'B' || mode == 'P' || mode == 'R' || mode == 'S';
+}
+
+// Real and complex pixels would show only their sign and exponent bits.
+bool CNitfImage::ServesUncompressed() const
+{
+    const char PVTYPE = subheaderText[kPvtypePosition];
+    if (PVTYPE == 'R' || PVTYPE == 'C')
+        return false;
+    if (isMono)
+        return NBANDS == 1 && IsMonoDepth(NBPP);
+    return isRgb && NBPP == 8 && NBANDS == (IsPaletted() ? 1 : int32_t(kRgbTables));
+}
+
+uint64_t CNitfImage::BandBlockBytes() const
+{
+    return uint64_t(NPPBH) * uint64_t(NPPBV) * uint64_t(bytesPerPixel);
+}
+
+// Every block the rows address must lie in the file: the whole image data
+// without a mask table, every stored block with one.
+bool CNitfImage::DataFitsFile() const
+{
+    const uint64_t available = readLimit - dataOffset;
+    uint64_t bandBlock = uint64_t(NPPBH);
+    if (!MultiplyWithin(bandBlock, uint64_t(NPPBV), available) ||
+        !MultiplyWithin(bandBlock, uint64_t(bytesPerPixel), available))
+        return false;
+    const bool bandsApart = IMODE() == 'S';
+    uint64_t storedBlock = bandBlock;
+    if (!bandsApart && !MultiplyWithin(storedBlock, uint64_t(NBANDS), available))
+        return false;
+    if (isMasked) {
+        for (uint32_t blockOffset : blockOffsets)
+            if (blockOffset != kBlockNotStored && (blockOffset > available || storedBlock > available - blockOffset))
+                return false;
+        return true;
+    }
+    uint64_t total = uint64_t(NBPR);
+    return MultiplyWithin(total, uint64_t(NBPC), available) && MultiplyWithin(total, uint64_t(NBANDS), available) &&
+           MultiplyWithin(total, bandBlock, available);
+}
+
+// JPEG rows come out one byte per pixel (grey) or three (colour), which is
+// what the row buffer holds; the decoder holds a bitmap per stored block.
+bool CNitfImage::PrepareJpegData(CFileReader& reader, uint32_t dataLength)
+{
+    const int64_t bits = int64_t(NBPP) * NBANDS;
+    if (bits != 8 && bits != 24)
+        return false;
+    const uint64_t blocks = uint64_t(NBPR) * uint64_t(NBPC);
+    if (blocks > (readLimit - dataOffset) / kSmallestJpegStream)
+        return false;
+    streamStart = dataOffset;
+    storedBlockCount = static_cast<uint32_t>(blocks);
+    if (isMasked && !IndexMaskedStreams())
+        return false;
+    return decoder.PrepareJpeg(reader, streamStart, dataLength, uint32_t(NBPP));
+}
+
+// A masked JPEG image stores only some blocks, each its own stream, in block
+// order one after another; the decoder reads them from the first one on, so
+// block b is the decoder's bitmap of its rank among the stored blocks.
+bool CNitfImage::IndexMaskedStreams()
+{
+    const size_t blocks = size_t(NBPR) * size_t(NBPC);
+    if (blockOffsets.size() < blocks)
+        return false;
+    streamIndex.assign(blocks, kBlockNotStored);
+    uint32_t stored = 0;
+    uint32_t previous = 0;
+    for (size_t b = 0; b < blocks; ++b) {
+        const uint32_t blockOffset = blockOffsets[b];
+        if (blockOffset == kBlockNotStored)
+            continue;
+        if (stored > 0 && blockOffset <= previous)
+            return false;
+        if (stored == 0)
+            streamStart = dataOffset + blockOffset;
+        if (uint64_t(dataOffset) + blockOffset >= readLimit)
+            return false;
+        streamIndex[b] = stored++;
+        previous = blockOffset;
+    }
+    storedBlockCount = stored;
+    return stored > 0;
+}
+
+void CNitfImage::AllocLineBuffer()
+{
+    FreeVector(lineBuffer);
+    if (isPrepared && compressionKind == kUncompressed)
+        lineBuffer.resize(size_t(NBANDS) * size_t(NPPBH) * size_t(bytesPerPixel));
+}
+
+bool CNitfImage::OpenCompressed(CFileReader& reader, uint32_t dataLength)
+{
+    const bool jpeg =
+        compressionKind == kJpeg || compressionKind == kLosslessJpeg || compressionKind == kDownsampledJpeg;
+    // A masked bi-level image ("M1") is not decoded; its rows fail.
+    const bool biLevel = compressionKind == kBiLevel && IC[0] == 'C';
+    if (!jpeg && !biLevel)
+        return true;
+    if (!isPrepared)
+        return false;
+    const uint32_t start = jpeg ? streamStart : dataOffset;
+    const uint32_t blocks = jpeg ? storedBlockCount : uint32_t(NBPR) * uint32_t(NBPC);
+    const uint32_t length = static_cast<uint32_t>(std::min<uint64_t>(dataLength, readLimit - start));
+    return decoder.Open(reader, start, blocks, length, uint32_t(NBPP), uint32_t(NBANDS), uint32_t(NCOLS),
+                        uint32_t(NROWS), COMRAT[0] == '1', uint32_t(NPPBH), uint32_t(NPPBV));
+}
+
+void CNitfImage::ReleaseDecoder()
+{
+    decoder.FreeBitmaps();
+}
