@@ -1,7 +1,89 @@
-// RPF frame branch: not served yet; the open reports failure.
+// RPF frame branch of the handler: a CADRG or CIB frame, found by the RPFHDR
+// extension in the NITF file header, described to the host as a 1536 x 1536
+// paletted image tied to its coverage corners, and drawn line by line by the
+// handler's RPF frame reader.
+#include "nitf/NitfFileHeader.h"
+#include "plugin/GeoRefRecord.h"
+#include "plugin/Palette.h"
 #include "plugin/RasterHandler.h"
 
-int32_t CRasterHandler::RpfOpen(RHHandle*, CFileReader&, const CNitfFileHeader&) { return 0; }
-void CRasterHandler::RpfDrawStart(int32_t) {}
-bool CRasterHandler::RpfReadLine(CFileReader&, uint32_t, int32_t, int32_t, uint8_t*) { return false; }
-void CRasterHandler::RpfDrawEnd() {}
+namespace {
+
+constexpr uint32_t kRpfFrameSize = 1536;         // columns and rows, whatever the frame's own geometry
+constexpr uint32_t kRpfHeaderDataOffset = 14;    // UDHOFL (3), extension tag (6), extension length (5)
+constexpr uint32_t kTableColors = 216;           // palette entries taken from the frame's table
+constexpr int32_t kRpfPaletteEntries = 217;      // plus white for the masked pixel value
+constexpr uint8_t kWhite = 255;
+
+// Fills palette entries 0..215 from the frame's colour table, or from its grey
+// table with each grey repeated three times; entry 216 is white.
+bool FillPalette(RpfColorGraySection& colors, uint8_t* entries)
+{
+    const bool fromColors = colors.IsColorTable();
+    for (uint32_t index = 0; index < kTableColors; ++index) {
+        uint8_t* entry = entries + index * 3;
+        if (fromColors) {
+            if (!colors.GetPaletteColor(index, entry[0], entry[1], entry[2]))
+                return false;
+        } else {
+            if (!colors.GetPaletteGray(index, entry[0]))
+                return false;
+            entry[1] = entry[2] = entry[0];
+        }
+    }
+    uint8_t* masked = entries + kTableColors * 3;
+    masked[0] = masked[1] = masked[2] = kWhite;
+    return true;
+}
+
+} // namespace
+
+int32_t CRasterHandler::RpfOpen(RHHandle* handle, CFileReader& reader, const CNitfFileHeader& header)
+{
+    if (header.userHeaderOffset == kNoUserHeader || header.userHeaderOffset > UINT32_MAX - kRpfHeaderDataOffset)
+        return 0;
+    if (!rpfReader.Open(reader, header.userHeaderOffset + kRpfHeaderDataOffset))
+        return 0;
+    handle->width = kRpfFrameSize;
+    handle->height = kRpfFrameSize;
+    RpfColorGraySection& colors = rpfReader.colorGraySection;
+    const bool paletted = colors.IsColorTable() || colors.IsGrayTable();
+    handle->pixelKind = paletted ? kPixelPaletted : kPixelRpfNoTable;
+
+    // Control points (0, 0), (1535, 0) and (0, 1535): the north-west,
+    // north-east and south-west corners, longitude before latitude.
+    const RpfCoverage& coverage = rpfReader.coverage;
+    const double corners[3][2] = {{coverage.northWestLongitude, coverage.northWestLatitude},
+                                  {coverage.northEastLongitude, coverage.northEastLatitude},
+                                  {coverage.southWestLongitude, coverage.southWestLatitude}};
+    handle->geoRef = CreateGeoRef(kEpsgGeographic, kRpfFrameSize, kRpfFrameSize, corners);
+    if (handle->geoRef == nullptr)
+        return 0;
+    if (paletted) {
+        handle->palette = CreatePalette(kRpfPaletteEntries);
+        if (handle->palette == nullptr || !FillPalette(colors, handle->palette->entries))
+            return 0;
+    }
+    handle->status = kStatusOk;
+    return 1;
+}
+
+void CRasterHandler::RpfDrawStart(int32_t rowWidth)
+{
+    rpfReader.PrepareDraw(rowWidth > 0 ? static_cast<uint32_t>(rowWidth) : 0);
+}
+
+bool CRasterHandler::RpfReadLine(CFileReader& reader, uint32_t row, int32_t firstColumn, int32_t lastColumn,
+                                 uint8_t* lineBuffer)
+{
+    if (row >= kRpfFrameSize || firstColumn < 0 || lastColumn < firstColumn ||
+        static_cast<uint32_t>(lastColumn) >= kRpfFrameSize)
+        return false;
+    return rpfReader.ReadLine(reader, row, static_cast<uint32_t>(firstColumn), static_cast<uint32_t>(lastColumn),
+                              lineBuffer);
+}
+
+void CRasterHandler::RpfDrawEnd()
+{
+    rpfReader.ReleaseCodeBuffer();
+}
