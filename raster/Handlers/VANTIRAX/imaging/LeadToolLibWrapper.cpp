@@ -1,15 +1,441 @@
 #include "imaging/LeadToolLibWrapper.h"
 
+#include "imaging/NitfJpegDefaults.h"
+#include "plugin/ByteOrder.h"
+
+#include <cstring>
+#include <memory>
+#include <new>
+#include <stdexcept>
+
 const char* const kReinitialisedText =
     "CLeadToolLibWrapper::openJPEGBitmap. Non sunctioned re initialization of BITMAPHANDLE array!";
 const char* const kDamagedImageText = "CLeadToolLibWrapper::openJPEGBitmap. Multi block image is damaged!";
 const char* const kOutOfMemoryText = "CLeadToolLibWrapper::openJPEGBitmap. Not enough memory for image displaying!";
 
-CLeadToolLibWrapper::CLeadToolLibWrapper() : tiffHeader{} {}
-CLeadToolLibWrapper::~CLeadToolLibWrapper() {}
-bool CLeadToolLibWrapper::PrepareBiLevel() { return false; }
-bool CLeadToolLibWrapper::PrepareJpeg(CFileReader&, uint32_t, uint32_t, uint32_t) { return false; }
-bool CLeadToolLibWrapper::Open(CFileReader&, uint32_t, uint32_t, uint32_t, uint32_t, uint32_t, uint32_t, uint32_t,
-                               bool, uint32_t, uint32_t) { return false; }
-bool CLeadToolLibWrapper::GetRow(uint32_t, uint32_t, uint32_t, uint32_t, uint32_t, uint8_t*) { return false; }
-void CLeadToolLibWrapper::FreeBitmaps() {}
+namespace {
+
+constexpr uint8_t kMarkerPrefix = 0xFF;
+constexpr uint8_t kStartOfImage = 0xD8;
+constexpr uint8_t kEndOfImage = 0xD9;
+constexpr uint8_t kApp6 = 0xE6;
+constexpr uint8_t kDefineHuffmanTables = 0xC4;
+constexpr uint8_t kDefineQuantisationTables = 0xDB;
+constexpr uint32_t kScanChunkSize = 100;
+constexpr uint32_t kLargestReaderOffset = 0x7FFFFFFF;   // CFileReader seeks take 32-bit signed offsets
+
+// The smallest JPEG stream a block can be: SOI, a one-component frame
+// header, a one-component scan header and EOI. A block count that the data
+// cannot hold at this size is refused before anything is allocated.
+constexpr uint32_t kSmallestJpegStream = 2 + 13 + 10 + 2;
+// NITF blocks are at most 8192 pixels a side, unless the image is one block.
+constexpr uint32_t kLargestNitfBlockSide = 8192;
+// The pixels one image may hold decoded in memory.
+constexpr uint64_t kMaxImageBytes = uint64_t(1) << 30;
+
+constexpr unsigned kColourBits = 24;
+constexpr uint8_t kRgbStreamColour = 1;
+constexpr uint8_t kWhitePixel = 255;
+constexpr uint8_t kBlackPixel = 0;
+
+bool IsUnservedDepth(uint32_t NBPP)
+{
+    return NBPP == 12 || NBPP == 16;
+}
+
+// Walks the FF xx pairs of the file from a start offset, reading 100 bytes
+// at a time. Segment payloads are not skipped: every pair counts. The scan
+// ends at a short read, after the bytes that read did deliver.
+struct MarkerScanner {
+    CFileReader& reader;
+    uint32_t start;
+    uint32_t chunkStart = 0;    // distance of chunk[0] from start
+    uint32_t chunkLength = 0;
+    uint32_t index = 0;
+    bool lastChunk = false;
+    uint8_t chunk[kScanChunkSize] = {};
+
+    MarkerScanner(CFileReader& fileReader, uint32_t startOffset) : reader(fileReader), start(startOffset) {}
+
+    // The next pair: the byte after the FF, and the FF's distance from start.
+    bool Next(uint8_t& code, uint32_t& distance)
+    {
+        for (;;) {
+            for (; index + 1 < chunkLength; ++index) {
+                if (chunk[index] == kMarkerPrefix) {
+                    code = chunk[index + 1];
+                    distance = chunkStart + index++;
+                    return true;
+                }
+            }
+            if (lastChunk)
+                return false;
+            Refill();
+        }
+    }
+
+    // An FF in the chunk's last byte is read again as the next chunk's first,
+    // so that its pair is seen whole.
+    void Refill()
+    {
+        bool keepLast = chunkLength > 0 && chunk[chunkLength - 1] == kMarkerPrefix;
+        chunkStart += keepLast ? chunkLength - 1 : chunkLength;
+        index = 0;
+        chunkLength = 0;
+        uint64_t at = uint64_t(start) + chunkStart;
+        if (at > kLargestReaderOffset || !reader.HoldsFile() || reader.error == kSeekFailed) {
+            lastChunk = true;
+            return;
+        }
+        reader.SeekTo(static_cast<int32_t>(at), kSeekSet);
+        reader.ReadBytes(chunk, kScanChunkSize);
+        if (reader.error == kSeekFailed) {
+            lastChunk = true;
+            return;
+        }
+        chunkLength = static_cast<uint32_t>(reader.position - at);
+        lastChunk = reader.endOfFile != 0;
+    }
+};
+
+void ClearReadFailure(CFileReader& reader)
+{
+    reader.error = 0;
+    reader.endOfFile = 0;
+}
+
+bool SeekAndRead(CFileReader& reader, uint64_t offset, void* buffer, uint32_t count)
+{
+    if (offset > kLargestReaderOffset)
+        return false;
+    reader.SeekTo(static_cast<int32_t>(offset), kSeekSet);
+    reader.ReadBytes(buffer, count);
+    return !reader.Failed();
+}
+
+void ToHostOrder16(uint8_t* field)
+{
+    uint16_t value = BigEndian16(field);
+    std::memcpy(field, &value, sizeof value);
+}
+
+void PutBigEndian32(uint8_t* field, uint32_t value)
+{
+    field[0] = static_cast<uint8_t>(value >> 24);
+    field[1] = static_cast<uint8_t>(value >> 16);
+    field[2] = static_cast<uint8_t>(value >> 8);
+    field[3] = static_cast<uint8_t>(value);
+}
+
+uint8_t ClampedByte(double value)
+{
+    return static_cast<uint8_t>((value > 255.0 ? 255.0 : value) + 0.5);
+}
+
+// The scaled colour conversion of three-byte pixels that the loader did not
+// deliver as R,G,B.
+void ConvertColours(uint8_t* pixels, int64_t byteCount)
+{
+    for (int64_t i = 0; i + 2 < byteCount; i += 3) {
+        double p0 = pixels[i], p1 = pixels[i + 1], p2 = pixels[i + 2];
+        pixels[i] = ClampedByte((0.299 * p0 + 0.587 * p1 + 0.114 * p2) * 1.3);
+        pixels[i + 1] = ClampedByte((0.5 * p2 - (0.1687 * p0 + 0.3313 * p1) + 128) * 1.3);
+        pixels[i + 2] = ClampedByte((0.5 * p0 - 0.4187 * p1 - 0.0813 * p2 + 128) * 1.3);
+    }
+}
+
+FILEINFO FreshFileInfo()
+{
+    FILEINFO info {};
+    info.structSize = sizeof info;
+    info.reserved = 0;
+    return info;
+}
+
+uint64_t BitmapBytes(const BITMAPHANDLE* bitmap)
+{
+    return uint64_t(bitmap->bytesPerLine) * bitmap->height;
+}
+
+}  // namespace
+
+CLeadToolLibWrapper::CLeadToolLibWrapper()
+{
+    std::memcpy(tiffHeader, kBiLevelTiffTemplate.data(), kTiffHeaderSize);
+}
+
+CLeadToolLibWrapper::~CLeadToolLibWrapper()
+{
+    FreeBitmaps();
+}
+
+bool CLeadToolLibWrapper::PrepareBiLevel()
+{
+    if (!EnsureLibrary())
+        return false;
+    kind = kBiLevelDecoder;
+    return true;
+}
+
+bool CLeadToolLibWrapper::PrepareJpeg(CFileReader& reader, uint32_t dataOffset, uint32_t /*LI*/, uint32_t NBPP)
+{
+    static const uint8_t kNitfJpegStart[4] = {kMarkerPrefix, kStartOfImage, kMarkerPrefix, kApp6};
+    uint8_t start[4] = {};
+    if (!EnsureLibrary() || IsUnservedDepth(NBPP))
+        return false;
+    if (!SeekAndRead(reader, dataOffset, start, sizeof start) || std::memcmp(start, kNitfJpegStart, 4) != 0) {
+        ClearReadFailure(reader);
+        return false;
+    }
+    if (!ReadNitfApp6(reader, dataOffset) || std::memcmp(app6 + 4, "NITF", 4) != 0)
+        return false;
+    kind = kJpegDecoder;
+    return true;
+}
+
+bool CLeadToolLibWrapper::Open(CFileReader& reader, uint32_t dataOffset, uint32_t blockCount, uint32_t LI,
+                               uint32_t NBPP, uint32_t NBANDS, uint32_t NCOLS, uint32_t NROWS, bool oneDimensional,
+                               uint32_t blockWidth, uint32_t blockHeight)
+{
+    if (kind == kNotPrepared || !EnsureLibrary())
+        return false;
+    // Checked before the counts change: FreeBitmaps walks bitmapCount records.
+    if (bitmaps != nullptr)
+        throw std::runtime_error(kReinitialisedText);
+    bitmapCount = blockCount;
+    bitsPerPixel = NBPP;
+    bandCount = NBANDS;
+    if (kind == kBiLevelDecoder)
+        return openBiLevelBitmap(reader, dataOffset, LI, NCOLS, NROWS, oneDimensional);
+    if (IsUnservedDepth(NBPP))
+        return false;
+    blockWidthLimit = blockWidth ? blockWidth : (NCOLS > kLargestNitfBlockSide ? NCOLS : kLargestNitfBlockSide);
+    blockHeightLimit = blockHeight ? blockHeight : (NROWS > kLargestNitfBlockSide ? NROWS : kLargestNitfBlockSide);
+    return openJPEGBitmap(reader, dataOffset);
+}
+
+bool CLeadToolLibWrapper::ReadNitfApp6(CFileReader& reader, uint32_t dataOffset)
+{
+    MarkerScanner scan(reader, dataOffset);
+    uint8_t code = 0;
+    uint32_t distance = 0;
+    bool found = false;
+    while (!found && scan.Next(code, distance))
+        found = code == kApp6;
+    if (!found || !SeekAndRead(reader, uint64_t(dataOffset) + distance, app6, kApp6Size)) {
+        ClearReadFailure(reader);
+        return false;
+    }
+    for (unsigned field : {0u, 2u, 12u, 14u})
+        ToHostOrder16(app6 + field);
+    return true;
+}
+
+bool CLeadToolLibWrapper::FindEndOfImage(CFileReader& reader, uint32_t start, uint32_t& length)
+{
+    MarkerScanner scan(reader, start);
+    uint8_t code = 0;
+    uint32_t distance = 0;
+    while (scan.Next(code, distance)) {
+        if (code == kEndOfImage) {
+            length = distance + 2;
+            return true;
+        }
+    }
+    return false;
+}
+
+bool CLeadToolLibWrapper::ScanTableMarkers(CFileReader& reader, uint32_t start, bool& hasDht, bool& hasDqt,
+                                           uint32_t& insertionPoint)
+{
+    MarkerScanner scan(reader, start);
+    uint8_t code = 0;
+    uint32_t distance = 0;
+    hasDht = hasDqt = false;
+    while (scan.Next(code, distance)) {
+        hasDht = hasDht || code == kDefineHuffmanTables;
+        hasDqt = hasDqt || code == kDefineQuantisationTables;
+        // SOF0, SOF1, RSTn, EOI, SOS, DRI: the tables must stand before these.
+        if (code == 0xC0 || code == 0xC1 || (code >= 0xD0 && code <= 0xD7) || code == kEndOfImage || code == 0xDA ||
+            code == 0xDD) {
+            insertionPoint = distance;
+            return true;
+        }
+    }
+    return false;
+}
+
+void CLeadToolLibWrapper::AllocateBitmaps(const ImagingBinding& library)
+{
+    bitmaps = new BITMAPHANDLE*[bitmapCount]();
+    freeBitmap = library.L_FreeBitmap;
+    for (uint32_t i = 0; i < bitmapCount; ++i) {
+        bitmaps[i] = new BITMAPHANDLE();
+        library.L_InitBitmap(bitmaps[i], sizeof(BITMAPHANDLE), 0, 0, 0);
+        library.L_AllocateBitmap(bitmaps[i], 0);
+    }
+}
+
+bool CLeadToolLibWrapper::openJPEGBitmap(CFileReader& reader, uint32_t dataOffset)
+{
+    ImagingBinding library {};
+    LOADFILEOPTION options {};
+    if (!CopyBinding(library))
+        return false;
+    library.L_GetDefaultLoadFileOption(&options, sizeof options);
+    if (bitmaps != nullptr)
+        throw std::runtime_error(kReinitialisedText);
+    uint64_t fileSize = reader.FileSize();
+    if (bitmapCount == 0 || dataOffset >= fileSize || bitmapCount > (fileSize - dataOffset) / kSmallestJpegStream)
+        return false;
+    AllocateBitmaps(library);
+    options.maxWidth = blockWidthLimit;
+    options.maxHeight = blockHeightLimit;
+    uint64_t imageBytes = 0;
+    uint32_t offset = dataOffset;
+    for (uint32_t block = 0; block < bitmapCount; ++block) {
+        uint32_t length = 0;
+        if (!FindEndOfImage(reader, offset, length))
+            throw std::runtime_error(kDamagedImageText);
+        ClearReadFailure(reader);
+        options.maxBytes = kMaxImageBytes - imageBytes;
+        if (!LoadBlock(reader, library, block, offset, length, options))
+            return false;
+        imageBytes += BitmapBytes(bitmaps[block]);
+        offset += length;
+    }
+    return true;
+}
+
+// One block's stream, loaded as it stands in the file; a stream the loader
+// refuses is tried again with the default tables that it lacks.
+bool CLeadToolLibWrapper::LoadBlock(CFileReader& reader, const ImagingBinding& library, uint32_t block,
+                                    uint32_t offset, uint32_t length, LOADFILEOPTION& options)
+{
+    uint32_t flags = streamColor() == kRgbStreamColour ? kLoadFlagsJpeg | kLoadFlagRgbStream : kLoadFlagsJpeg;
+    FILEINFO info = FreshFileInfo();
+    int loaded = library.L_LoadFileOffset(static_cast<int>(reader.handle), offset, length, bitmaps[block],
+                                          sizeof(BITMAPHANDLE), kBitsAsStored, kOrderRgb, flags, nullptr, nullptr,
+                                          &options, &info);
+    if (loaded != kLoadSucceeded && !LoadWithDefaultTables(reader, library, block, offset, length, options, info))
+        return false;
+    loaderConverted = info.colorConverted != 0 ? 1 : 0;
+    return true;
+}
+
+bool CLeadToolLibWrapper::LoadWithDefaultTables(CFileReader& reader, const ImagingBinding& library, uint32_t block,
+                                                uint32_t offset, uint32_t length, LOADFILEOPTION& options,
+                                                FILEINFO& info)
+{
+    bool hasDht = false, hasDqt = false;
+    uint32_t insertAt = 0;
+    bool scanned = ScanTableMarkers(reader, offset, hasDht, hasDqt, insertAt);
+    ClearReadFailure(reader);
+    if (!scanned || insertAt >= length || (hasDht && hasDqt))
+        return false;
+    // Quality 1 to 5 selects a default DQT; other values have none.
+    uint8_t q = quality();
+    if (!hasDqt && (q < 1 || q > kDefaultQualities))
+        return false;
+    uint32_t dqtSize = hasDqt ? 0 : kDqtSegmentSize;
+    uint32_t dhtSize = hasDht ? 0 : kDhtSegmentSize;
+    uint64_t total = uint64_t(length) + dqtSize + dhtSize;
+    if (total > UINT32_MAX)
+        return false;
+    std::unique_ptr<uint8_t[]> stream(new (std::nothrow) uint8_t[total]);
+    if (!stream)
+        throw std::runtime_error(kOutOfMemoryText);
+    uint8_t* tables = stream.get() + insertAt;
+    if (dqtSize)
+        std::memcpy(tables, kDefaultDqt[q - 1], dqtSize);
+    if (dhtSize)
+        std::memcpy(tables + dqtSize, kDefaultDht, dhtSize);
+    if (!SeekAndRead(reader, offset, stream.get(), insertAt) ||
+        !SeekAndRead(reader, uint64_t(offset) + insertAt, tables + dqtSize + dhtSize, length - insertAt))
+        return false;
+    info = FreshFileInfo();
+    uint32_t flags = streamColor() == kRgbStreamColour ? kLoadFlagsJpeg | kLoadFlagRgbStream : kLoadFlagsJpeg;
+    return library.L_LoadMemory(stream.get(), bitmaps[block], sizeof(BITMAPHANDLE), kBitsAsStored, kOrderRgb, flags,
+                                nullptr, nullptr, static_cast<uint32_t>(total), &options, &info) == kLoadSucceeded;
+}
+
+bool CLeadToolLibWrapper::openBiLevelBitmap(CFileReader& reader, uint32_t dataOffset, uint32_t LI, uint32_t NCOLS,
+                                            uint32_t NROWS, bool oneDimensional)
+{
+    ImagingBinding library {};
+    if (!CopyBinding(library))
+        return false;
+    if (bitmaps != nullptr)
+        throw std::runtime_error(kReinitialisedText);
+    bitmapCount = 1;
+    // Every coded row takes at least one bit of the strip.
+    uint64_t fileSize = reader.FileSize();
+    if (LI == 0 || dataOffset > fileSize || LI > fileSize - dataOffset || LI > UINT32_MAX - kTiffHeaderSize ||
+        NCOLS == 0 || NROWS == 0 || NROWS / 8 > LI)
+        return false;
+    AllocateBitmaps(library);
+    uint32_t total = LI + kTiffHeaderSize;
+    std::unique_ptr<uint8_t[]> file(new (std::nothrow) uint8_t[total]);
+    if (!file)
+        throw std::runtime_error(kOutOfMemoryText);
+    PutBigEndian32(tiffHeader + kTiffImageWidthValue, NCOLS);
+    PutBigEndian32(tiffHeader + kTiffImageLengthValue, NROWS);
+    PutBigEndian32(tiffHeader + kTiffRowsPerStripValue, NROWS);
+    PutBigEndian32(tiffHeader + kTiffStripByteCountsValue, LI);
+    PutBigEndian32(tiffHeader + kTiffT4OptionsValue, oneDimensional ? kT4OneDimensional : kT4TwoDimensional);
+    std::memcpy(file.get(), tiffHeader, kTiffHeaderSize);
+    if (!SeekAndRead(reader, dataOffset, file.get() + kTiffHeaderSize, LI))
+        return false;
+    LOADFILEOPTION options {};
+    library.L_GetDefaultLoadFileOption(&options, sizeof options);
+    options.maxWidth = NCOLS;
+    options.maxHeight = NROWS;
+    options.maxBytes = kMaxImageBytes;
+    FILEINFO info = FreshFileInfo();
+    return library.L_LoadMemory(file.get(), bitmaps[0], sizeof(BITMAPHANDLE), kBitsAsStored, kOrderAsStored,
+                                kLoadFlagsBiLevel, nullptr, nullptr, total, &options, &info) == kLoadSucceeded;
+}
+
+bool CLeadToolLibWrapper::GetRow(uint32_t block, uint32_t row, uint32_t firstColumn, uint32_t lastColumn,
+                                 uint32_t byteCount, uint8_t* destination)
+{
+    ImagingBinding library {};
+    if (!CopyBinding(library) || bitmaps == nullptr || block >= bitmapCount || destination == nullptr ||
+        lastColumn < firstColumn)
+        return false;
+    BITMAPHANDLE* bitmap = bitmaps[block];
+    int64_t fetched = 0;
+    if (kind == kBiLevelDecoder) {
+        uint32_t scratchSize = byteCount < bitmap->bytesPerLine ? byteCount : bitmap->bytesPerLine;
+        std::unique_ptr<uint8_t[]> packed(new uint8_t[scratchSize + 1]);
+        library.L_AccessBitmap(bitmap);
+        fetched = library.L_GetBitmapRowCol(bitmap, packed.get(), row, firstColumn, scratchSize);
+        library.L_ReleaseBitmap(bitmap);
+        uint64_t pixels = uint64_t(lastColumn) - firstColumn + 1;
+        if (fetched > 0 && pixels > uint64_t(fetched) * 8)
+            pixels = uint64_t(fetched) * 8;
+        for (uint64_t i = 0; fetched > 0 && i < pixels; ++i)
+            destination[i] = (packed[i / 8] & (0x80 >> (i % 8))) ? kBlackPixel : kWhitePixel;
+        return fetched >= 1;
+    }
+    library.L_AccessBitmap(bitmap);
+    fetched = library.L_GetBitmapRowCol(bitmap, destination, row, firstColumn, byteCount);
+    library.L_ReleaseBitmap(bitmap);
+    if (bitsPerPixel * bandCount == kColourBits && streamColor() == kRgbStreamColour && byteCount != 0 &&
+        !loaderConverted)
+        ConvertColours(destination, fetched);
+    return fetched >= 1;
+}
+
+void CLeadToolLibWrapper::FreeBitmaps()
+{
+    if (bitmaps == nullptr)
+        return;
+    for (uint32_t i = 0; i < bitmapCount; ++i) {
+        if (bitmaps[i] != nullptr && freeBitmap != nullptr)
+            freeBitmap(bitmaps[i]);
+        delete bitmaps[i];
+    }
+    delete[] bitmaps;
+    bitmaps = nullptr;
+}

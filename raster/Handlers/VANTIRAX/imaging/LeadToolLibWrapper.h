@@ -9,7 +9,7 @@
 // every other failure is a false result.
 #pragma once
 
-#include "imaging/ImagingRecords.h"
+#include "imaging/ImagingLibrary.h"
 #include "plugin/FileReader.h"
 
 #include <cstdint>
@@ -73,6 +73,13 @@ public:
 private:
     static constexpr unsigned kApp6QualityOffset = 20;
     static constexpr unsigned kApp6StreamColorOffset = 21;
-    uint32_t blockWidthLimit = 0;
+    uint32_t blockWidthLimit = 0;           // the largest frame a block's stream may declare
     uint32_t blockHeightLimit = 0;
+    L_FreeBitmapFunction freeBitmap = nullptr;  // the kernel that allocated `bitmaps`
+
+    void AllocateBitmaps(const ImagingBinding& library);
+    bool LoadBlock(CFileReader& reader, const ImagingBinding& library, uint32_t block, uint32_t offset,
+                   uint32_t length, LOADFILEOPTION& options);
+    bool LoadWithDefaultTables(CFileReader& reader, const ImagingBinding& library, uint32_t block, uint32_t offset,
+                               uint32_t length, LOADFILEOPTION& options, FILEINFO& info);
 };
