@@ -1,0 +1,212 @@
+#include "nitf/tests/NitfTestFile.h"
+#include "tests/fixtures/NitfImageWriter.h"
+
+#include <gtest/gtest.h>
+
+namespace {
+
+uint64_t Ramp(int32_t band, int32_t row, int32_t column)
+{
+    return uint64_t(band * 100 + row * 7 + column) & 0xFF;
+}
+
+// A 3-band RGB image of 7 x 5 in 2 x 2 blocks of 4 x 3: padded edge blocks.
+NitfImageSpec BlockedRgb(char IMODE)
+{
+    NitfImageSpec spec;
+    spec.rows = 5;
+    spec.columns = 7;
+    spec.IREP = "RGB";
+    spec.bands = {NitfBandSpec{"R", 0, 0, ""}, NitfBandSpec{"G", 0, 0, ""}, NitfBandSpec{"B", 0, 0, ""}};
+    spec.IMODE = IMODE;
+    spec.NBPR = 2;
+    spec.NBPC = 2;
+    spec.NPPBH = 4;
+    spec.NPPBV = 3;
+    return spec;
+}
+
+std::vector<uint8_t> ExpectedRgbRow(int32_t row, int32_t first, int32_t last)
+{
+    std::vector<uint8_t> expected;
+    for (int32_t c = first; c <= last; ++c)
+        for (int32_t band = 0; band < 3; ++band)
+            expected.push_back(uint8_t(Ramp(band, row, c)));
+    return expected;
+}
+
+std::vector<uint8_t> Head(std::vector<uint8_t> row, size_t count)
+{
+    row.resize(std::min(row.size(), count));
+    return row;
+}
+
+// The band stride of IMODE "S" is a whole band of padded blocks, not NROWS x NCOLS.
+TEST(LineReader, EveryImodeGivesTheSameRowsAcrossPaddedBlocks)
+{
+    for (char IMODE : {'B', 'P', 'R', 'S'}) {
+        const NitfImageSpec spec = BlockedRgb(IMODE);
+        LoadedImage loaded(BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, Ramp))));
+        ASSERT_TRUE(loaded.Open()) << IMODE;
+        for (int32_t row = 0; row < spec.rows; ++row)
+            EXPECT_EQ(Head(loaded.Row(uint32_t(row)), 21), ExpectedRgbRow(row, 0, 6)) << IMODE << row;
+        // A span from the middle of one block to the middle of the next.
+        EXPECT_EQ(Head(loaded.Row(4, 2, 5), 12), ExpectedRgbRow(4, 2, 5)) << IMODE;
+    }
+}
+
+// A row costs about its own bytes: the scratch buffer holds one block row, not a block.
+TEST(LineReader, ScratchBufferHoldsOneRowOfABlock)
+{
+    NitfImageSpec spec = BlockedRgb('B');
+    LoadedImage loaded(BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, Ramp))));
+    ASSERT_TRUE(loaded.Open());
+    EXPECT_EQ(loaded.image.lineBuffer.size(), 3u * 4u);
+}
+
+TEST(LineReader, MaskedBlocksThatAreNotStoredComeOutAsZeros)
+{
+    for (char IMODE : {'B', 'P', 'S'}) {
+        NitfImageSpec spec = BlockedRgb(IMODE);
+        spec.IC = "NM";
+        const std::vector<std::string> blocks = BuildImageBlocks(spec, Ramp);
+        std::vector<bool> stored(blocks.size(), true);
+        stored[1] = false; // block 1 (of band 0 in IMODE "S")
+        LoadedImage loaded(BuildImageFile(spec, BuildMaskedData(blocks, stored, 8)));
+        ASSERT_TRUE(loaded.Open()) << IMODE;
+        EXPECT_TRUE(loaded.image.isMasked);
+        std::vector<uint8_t> expected = ExpectedRgbRow(0, 0, 6);
+        for (int32_t c = 4; c < 7; ++c)
+            for (int32_t band = 0; band < (IMODE == 'S' ? 1 : 3); ++band)
+                expected[size_t(c * 3 + band)] = 0;
+        EXPECT_EQ(Head(loaded.Row(0), 21), expected) << IMODE;
+        EXPECT_EQ(Head(loaded.Row(4), 21), ExpectedRgbRow(4, 0, 6)) << IMODE;
+    }
+}
+
+TEST(LineReader, WideMonochromeKeepsTheTopSignificantBits)
+{
+    NitfImageSpec spec;
+    spec.columns = 3;
+    spec.NBPP = 16;
+    spec.ABPP = 11;
+    const uint64_t values[] = {0x07FF, 0x0400, 0x0008};
+    auto pixel = [&](int32_t, int32_t, int32_t column) { return values[column]; };
+    LoadedImage right(BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, pixel))));
+    ASSERT_TRUE(right.Open());
+    EXPECT_EQ(Head(right.Row(0), 3), (std::vector<uint8_t>{0xFF, 0x80, 0x01}));
+
+    spec.PJUST = 'L'; // the significant bits stand at the top of the pixel
+    LoadedImage left(BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, pixel))));
+    ASSERT_TRUE(left.Open());
+    EXPECT_EQ(Head(left.Row(0), 3), (std::vector<uint8_t>{0x07, 0x04, 0x00}));
+
+    spec.PJUST = 'R';
+    spec.NBPP = 32;
+    spec.ABPP = 20; // more than 8 bits below the two top bytes
+    const uint64_t wide[] = {0xFFFFF, 0x80000, 0x00FFF};
+    auto widePixel = [&](int32_t, int32_t, int32_t column) { return wide[column]; };
+    LoadedImage bits20(BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, widePixel))));
+    ASSERT_TRUE(bits20.Open());
+    EXPECT_EQ(Head(bits20.Row(0), 3), (std::vector<uint8_t>{0xFF, 0x80, 0x00}));
+}
+
+TEST(LineReader, Palettes)
+{
+    NitfImageSpec spec;
+    spec.IREP = "RGB/LUT";
+    spec.bands = {NitfBandSpec{"LU", 3, 200, RgbLookupTables(200)}};
+    LoadedImage lut(BuildImageFile(spec, "\x05"));
+    ASSERT_TRUE(lut.Open());
+    EXPECT_EQ(lut.image.GetPaletteSize(), 200);
+    uint8_t red = 0, green = 0, blue = 0;
+    ASSERT_TRUE(lut.image.GetPaletteEntry(199, red, green, blue));
+    EXPECT_EQ(std::vector<uint8_t>({red, green, blue}), std::vector<uint8_t>({199, 56, 99}));
+    EXPECT_FALSE(lut.image.GetPaletteEntry(200, red, green, blue)); // past the lookup data
+    EXPECT_FALSE(lut.image.GetPaletteEntry(-1, red, green, blue));
+
+    NitfImageSpec mono; // no table: the grey ramp; 256 entries whatever NELUT says
+    mono.NBPP = 16;
+    LoadedImage grey(BuildImageFile(mono, std::string(2, '\0')));
+    ASSERT_TRUE(grey.Open());
+    EXPECT_TRUE(grey.image.IsPaletted());
+    EXPECT_EQ(grey.image.GetPaletteSize(), 256);
+    ASSERT_TRUE(grey.image.GetPaletteEntry(77, red, green, blue));
+    EXPECT_EQ(std::vector<uint8_t>({red, green, blue}), std::vector<uint8_t>({77, 77, 77}));
+
+    mono.NBPP = 8;
+    mono.bands = {NitfBandSpec{"LU", 1, 10, "0123456789"}};
+    LoadedImage shortTable(BuildImageFile(mono, std::string(1, '\0')));
+    ASSERT_TRUE(shortTable.Open());
+    EXPECT_EQ(shortTable.image.GetPaletteSize(), 256);
+    ASSERT_TRUE(shortTable.image.GetPaletteEntry(9, red, green, blue));
+    EXPECT_EQ(red, '9');
+    EXPECT_FALSE(shortTable.image.GetPaletteEntry(10, red, green, blue));
+}
+
+TEST(LineReader, RefusesRowsAndSpansOutsideTheImage)
+{
+    const NitfImageSpec spec = BlockedRgb('P');
+    LoadedImage loaded(BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, Ramp))));
+    ASSERT_TRUE(loaded.Open());
+    std::vector<uint8_t> out(64, 0xEE);
+    EXPECT_FALSE(loaded.image.ReadLine(loaded.reader, 5, 0, 6, out.data()));
+    EXPECT_FALSE(loaded.image.ReadLine(loaded.reader, 0, 0, 7, out.data()));
+    EXPECT_FALSE(loaded.image.ReadLine(loaded.reader, 0, -1, 3, out.data()));
+    EXPECT_FALSE(loaded.image.ReadLine(loaded.reader, 0, 4, 3, out.data()));
+    EXPECT_EQ(out, std::vector<uint8_t>(64, 0xEE));
+}
+
+// Layouts the reader cannot address safely are refused when the data is prepared.
+TEST(LineReader, RefusesGeometriesThatDoNotFitTheFile)
+{
+    const NitfImageSpec good = BlockedRgb('B');
+    const std::string data = JoinBlocks(BuildImageBlocks(good, Ramp));
+    auto prepares = [&](const NitfImageSpec& spec, const std::string& bytes) {
+        LoadedImage loaded(BuildImageFile(spec, bytes));
+        return loaded.Parse() && loaded.image.PrepareData(loaded.reader, uint32_t(bytes.size()));
+    };
+    EXPECT_TRUE(prepares(good, data));
+    EXPECT_FALSE(prepares(good, data.substr(0, data.size() - 1))); // short final block
+
+    NitfImageSpec spec = good;
+    spec.NPPBH = 0; // a block width of 0 with two blocks per row
+    EXPECT_FALSE(prepares(spec, data));
+    spec = good;
+    spec.NBPR = 9999; // block counts far beyond the file
+    spec.NBPC = 9999;
+    EXPECT_FALSE(prepares(spec, data));
+    spec = good;
+    spec.NBPR = 1; // blocks that do not cover the image
+    EXPECT_FALSE(prepares(spec, data));
+    spec = good;
+    spec.IMODE = 'X';
+    EXPECT_FALSE(prepares(spec, data));
+    spec = good;
+    spec.PVTYPE = "R";
+    spec.IREP = "MONO";
+    spec.NBPP = 32;
+    spec.bands.resize(1);
+    EXPECT_FALSE(prepares(spec, std::string(7 * 5 * 4, '\0'))); // floating point
+
+    spec = good; // a mask table with more records than the file holds
+    spec.IC = "NM";
+    spec.NBPR = 999;
+    spec.NBPC = 999;
+    LoadedImage masked(BuildImageFile(spec, BuildMaskedData(BuildImageBlocks(good, Ramp), {true, true, true, true})));
+    EXPECT_FALSE(masked.Parse());
+}
+
+TEST(LineReader, CompressedKindsWithoutDecodableDataFailTheirRows)
+{
+    NitfImageSpec spec;
+    spec.IC = "C4";
+    spec.COMRAT = "    ";
+    spec.IREP = "RGB/LUT";
+    spec.bands = {NitfBandSpec{"LU", 3, 2, RgbLookupTables(2)}};
+    LoadedImage vq(BuildImageFile(spec, std::string(16, '\0')));
+    ASSERT_TRUE(vq.Open()); // served, as the file declares it, but no row decodes
+    EXPECT_TRUE(vq.Row(0).empty());
+}
+
+} // namespace
