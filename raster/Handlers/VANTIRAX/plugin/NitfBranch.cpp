@@ -1,6 +1,90 @@
-// Plain NITF branch: not served yet; the open reports failure.
+// Plain NITF branch: the handler serves the first image segment of a NITF
+// file that is not an RPF frame, through its CNitfImage.
 #include "plugin/RasterHandler.h"
 
-int32_t CRasterHandler::NitfOpen(RHHandle*, CFileReader&, const CNitfFileHeader&) { return 0; }
-bool CRasterHandler::NitfReadLine(CFileReader&, uint32_t, int32_t, int32_t, uint8_t*) { return false; }
-void CRasterHandler::NitfClose() {}
+#include "geo/ImageCorners.h"
+#include "nitf/NitfFileHeader.h"
+#include "plugin/FailureCodes.h"
+#include "plugin/GeoRefRecord.h"
+#include "plugin/Palette.h"
+
+#include <cstring>
+
+namespace {
+
+constexpr char kNoCorners = ' ';
+
+// The georeference record of the image corners, or null when the subheader
+// has none (or the record cannot be allocated).
+RHGeoRef* CornerGeoRef(const CNitfImage& image, uint32_t width, uint32_t height)
+{
+    if (image.ICORDS() == kNoCorners || image.IGEOLO == nullptr)
+        return nullptr;
+    const ImageCornerFields fields{image.ICORDS(), image.IGEOLO.get(), image.version21 != 0};
+    double corners[3][2] = {};
+    ReadImageCorners(fields, corners[0][0], corners[0][1], corners[1][0], corners[1][1], corners[2][0],
+                     corners[2][1]);
+    int32_t epsgCode = ImageCornerEpsgCode(fields, int32_t(kEpsgGeographic));
+    if (epsgCode == kEpsgNone)
+        epsgCode = int32_t(kEpsgGeographic);
+    return CreateGeoRef(uint32_t(epsgCode), width, height, corners);
+}
+
+// A palette of GetPaletteSize entries filled from the last index down;
+// entries the image does not answer stay black.
+RHPalette* ImagePalette(const CNitfImage& image)
+{
+    RHPalette* palette = CreatePalette(image.GetPaletteSize());
+    if (palette == nullptr || palette->entryCount <= 0)
+        return palette;
+    std::memset(palette->entries, 0, size_t(palette->entryCount) * 3);
+    for (int32_t index = palette->entryCount - 1; index >= 0; --index) {
+        uint8_t* entry = palette->entries + size_t(index) * 3;
+        image.GetPaletteEntry(index, entry[0], entry[1], entry[2]);
+    }
+    return palette;
+}
+
+} // namespace
+
+int32_t CRasterHandler::NitfOpen(RHHandle* handle, CFileReader& reader, const CNitfFileHeader& header)
+{
+    const NitfSegmentLength& segment = header.imageSegments[0];
+    nitfImage.fixedLayout = header.fixedLayout;
+    nitfImage.version21 = header.version21;
+    nitfImage.subheaderLength = segment.subheaderLength;
+    if (!nitfImage.ReadSubheader(reader, header.HL))
+        throw kCodeSubheader;
+    // A kind this library does not serve: the open answers 1, the status 5 says it failed.
+    if (!nitfImage.PrepareData(reader, segment.dataLength)) {
+        lastError = static_cast<int32_t>(kCodePrepare);
+        return 1;
+    }
+    handle->width = uint32_t(nitfImage.NCOLS);
+    handle->height = uint32_t(nitfImage.NROWS);
+    handle->geoRef = CornerGeoRef(nitfImage, handle->width, handle->height);
+    if (nitfImage.IsPaletted()) {
+        handle->pixelKind = nitfImage.isMono ? kPixelGreyPaletted : kPixelPaletted;
+        handle->palette = ImagePalette(nitfImage);
+    } else {
+        handle->pixelKind = kPixelDirect;
+        handle->palette = nullptr;
+    }
+    nitfImage.AllocLineBuffer();
+    // A failed decode shows as failing rows.
+    nitfImage.OpenCompressed(reader, segment.dataLength);
+    handle->status = kStatusOk;
+    return 1;
+}
+
+bool CRasterHandler::NitfReadLine(CFileReader& reader, uint32_t row, int32_t firstColumn, int32_t lastColumn,
+                                  uint8_t* buffer)
+{
+    return nitfImage.ReadLine(reader, row, firstColumn, lastColumn, buffer);
+}
+
+void CRasterHandler::NitfClose()
+{
+    FreeVector(nitfImage.lineBuffer);
+    nitfImage.ReleaseDecoder();
+}
