@@ -11,6 +11,7 @@ its centre, so half the square's size is taken off here.
 
 Run from anywhere: python3 make_geoconvert_table.py
 """
+import math
 import os
 import subprocess
 
@@ -58,14 +59,17 @@ def sample_points():
     for latitude in (72.1, 78.0, 83.9):
         for longitude in (0.1, 8.9, 9.1, 15.0, 20.9, 21.1, 32.9, 33.1, 38.0, 41.9, 42.1):
             points.append((latitude, longitude, 0))
-    # Beyond 3 degrees: a neighbouring zone requested, up to 9 degrees out.
-    for i in range(60):
+    # Beyond 3 degrees: a neighbouring zone requested, up to 9 degrees out,
+    # each far from the central meridian, where the series is least accurate:
+    # 395 km (just inside the 100 km easting limit of the inverse) or 470 km
+    # (about as far as GeoConvert goes).
+    for i in range(90):
         zone = (i * 11) % 60 + 1
-        band = BANDS[(i * 3) % len(BANDS)]
-        if band in "VX":
-            band = "U"
-        latitude = band_bottom(band) + 1.5 + (i * 0.61) % 5
         offset = 3.0 + (i * 0.1) % 6.0
+        distance = 470.0 if i % 3 == 0 else 395.0
+        latitude = math.degrees(math.acos(min(1.0, distance / (111.3 * offset)))) + 0.2
+        if i % 4 >= 2:
+            latitude = -min(latitude, 79.5)
         west = i % 2 == 0
         longitude = central_meridian(zone) + (-offset if west else offset)
         requested = zone - 1 if west else zone + 1
@@ -74,6 +78,8 @@ def sample_points():
             longitude -= 360
         if longitude < -180:
             longitude += 360
+        if 56 <= latitude < 64 or latitude >= 72:
+            continue  # keeps clear of the exceptional zones
         points.append((round(latitude, 6), round(longitude, 6), zone))
         points.append((round(latitude, 6), round(longitude, 6), requested))
     return points
@@ -83,7 +89,7 @@ def utm_rows(points):
     rows = []
     for requested in sorted({p[2] for p in points}):
         group = [p for p in points if p[2] == requested]
-        args = ["-u", "-p", "4"] + (["-z", str(requested)] if requested else [])
+        args = ["-u", "-p", "6"] + (["-z", str(requested)] if requested else [])
         outputs = geoconvert(args, ["%.6f %.6f" % (lat, lon) for lat, lon, _ in group])
         for (lat, lon, _), out in zip(group, outputs):
             if out is None:
