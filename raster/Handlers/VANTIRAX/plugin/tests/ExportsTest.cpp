@@ -1,43 +1,22 @@
 // The export layer as the host sees it: the built handler file loaded at run
 // time, driven through its seven functions.
 #include "plugin/HostRecords.h"
+#include "tests/fixtures/HandlerLoader.h"
 #include "tests/fixtures/NitfFileWriter.h"
 #include "tests/fixtures/TempFiles.h"
 
 #include <gtest/gtest.h>
 
 #include <cstring>
-#include <dlfcn.h>
 #include <memory>
 
 namespace {
 
-struct Handler {
-    int32_t (*isFormat)(const char*);
-    int32_t (*identify)(RHIdentity*);
-    int32_t (*open)(RHHandle*, const char*);
-    int32_t (*startDraw)(RHHandle*, void*, const int32_t*, double, uint32_t*);
-    int32_t (*getLine)(RHHandle*, uint32_t, uint8_t**, uint16_t*);
-    int32_t (*endDraw)(RHHandle*);
-    int32_t (*close)(RHHandle*);
-};
+using Handler = HandlerExports;
 
 const Handler& LoadedHandler()
 {
-    static Handler handler = [] {
-        void* library = dlopen(VX_HANDLER_PATH, RTLD_NOW | RTLD_LOCAL);
-        EXPECT_NE(library, nullptr) << dlerror();
-        Handler h{};
-        h.isFormat = reinterpret_cast<decltype(h.isFormat)>(dlsym(library, "RH_IsFormat"));
-        h.identify = reinterpret_cast<decltype(h.identify)>(dlsym(library, "RH_Identify"));
-        h.open = reinterpret_cast<decltype(h.open)>(dlsym(library, "RH_Open"));
-        h.startDraw = reinterpret_cast<decltype(h.startDraw)>(dlsym(library, "RH_StartDraw"));
-        h.getLine = reinterpret_cast<decltype(h.getLine)>(dlsym(library, "RH_GetLine"));
-        h.endDraw = reinterpret_cast<decltype(h.endDraw)>(dlsym(library, "RH_EndDraw"));
-        h.close = reinterpret_cast<decltype(h.close)>(dlsym(library, "RH_Close"));
-        return h;
-    }();
-    return handler;
+    return LoadHandler(VX_HANDLER_PATH);
 }
 
 constexpr uint32_t kHostStatus = 77; // a value the library never writes
