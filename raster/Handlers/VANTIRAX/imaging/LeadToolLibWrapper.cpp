@@ -94,7 +94,9 @@ struct MarkerScanner {
             return;
         }
         chunkLength = static_cast<uint32_t>(reader.position - at);
+        // Reaching the end of the file ends the scan; it is no read failure.
         lastChunk = reader.endOfFile != 0;
+        reader.endOfFile = 0;
     }
 };
 

@@ -1,0 +1,288 @@
+#include "imaging/LeadToolLibWrapper.h"
+#include "imaging/tests/DecoderTestFile.h"
+#include "tests/fixtures/JpegBlockWriter.h"
+#include "tests/fixtures/LosslessJpegWriter.h"
+
+#include <gtest/gtest.h>
+
+#include <stdexcept>
+
+#include <jpeglib.h>
+
+namespace {
+
+// The block size of the tests' images.
+constexpr uint32_t kSide = 16;
+
+// Decodes a plain JPEG stream with libjpeg, as an independent reference.
+Bytes DecodeWithLibjpeg(const Bytes& stream, int components)
+{
+    jpeg_decompress_struct decoder {};
+    jpeg_error_mgr errors {};
+    decoder.err = jpeg_std_error(&errors);
+    jpeg_create_decompress(&decoder);
+    jpeg_mem_src(&decoder, stream.data(), stream.size());
+    jpeg_read_header(&decoder, TRUE);
+    decoder.out_color_space = components == 3 ? JCS_RGB : JCS_GRAYSCALE;
+    jpeg_start_decompress(&decoder);
+    Bytes pixels(size_t(decoder.output_width) * decoder.output_height * components);
+    while (decoder.output_scanline < decoder.output_height) {
+        JSAMPROW row = pixels.data() + size_t(decoder.output_scanline) * decoder.output_width * components;
+        jpeg_read_scanlines(&decoder, &row, 1);
+    }
+    jpeg_finish_decompress(&decoder);
+    jpeg_destroy_decompress(&decoder);
+    return pixels;
+}
+
+struct OpenedJpeg {
+    DecoderTestFile file;
+    CLeadToolLibWrapper decoder;
+    bool prepared = false;
+    bool opened = false;
+
+    OpenedJpeg(const Bytes& data, uint32_t blocks, uint32_t bands = 1, uint32_t side = kSide)
+        : file(data)
+    {
+        prepared = decoder.PrepareJpeg(file.reader, kTestDataOffset, uint32_t(data.size()), 8);
+        if (prepared)
+            opened = decoder.Open(file.reader, kTestDataOffset, blocks, uint32_t(data.size()), 8, bands,
+                                  side * blocks, side, false, side, side);
+    }
+
+    // Every row of a block, as GetRow delivers them.
+    Bytes Block(uint32_t block, uint32_t bands = 1)
+    {
+        Bytes pixels(kSide * kSide * bands);
+        for (uint32_t row = 0; row < kSide; ++row)
+            EXPECT_TRUE(decoder.GetRow(block, row, 0, kSide - 1, kSide * bands, pixels.data() + row * kSide * bands));
+        return pixels;
+    }
+};
+
+TEST(JpegDecode, FourSelfContainedBlocksDecodeAsLibjpegDoes)
+{
+    std::vector<Bytes> blocks;
+    for (unsigned i = 0; i < 4; ++i)
+        blocks.push_back(EncodeJpegBlock(TestPattern(kSide, kSide, 1, i), JpegBlockSpec {}));
+    OpenedJpeg image(BuildNitfJpegData(blocks, NitfApp6Spec {4, 1, 0, 0}), 4);
+    ASSERT_TRUE(image.prepared);
+    ASSERT_TRUE(image.opened);
+    EXPECT_EQ(image.decoder.app6[12] | (image.decoder.app6[13] << 8), 4);   // blocks per row, host order
+    for (unsigned i = 0; i < 4; ++i)
+        EXPECT_EQ(image.Block(i), DecodeWithLibjpeg(blocks[i], 1)) << "block " << i;
+    EXPECT_FALSE(image.decoder.GetRow(4, 0, 0, kSide - 1, kSide, image.Block(0).data()));
+}
+
+TEST(JpegDecode, MissingTablesAreTakenFromTheQualityByte)
+{
+    Bytes pattern = TestPattern(kSide, kSide, 1, 7);
+    JpegBlockSpec withTables;
+    withTables.defaultQuality = 3;
+    Bytes complete = EncodeJpegBlock(pattern, withTables);
+    Bytes expected = OpenedJpeg(BuildNitfJpegData({complete}, {}), 1).Block(0);
+    EXPECT_EQ(expected, DecodeWithLibjpeg(complete, 1));
+
+    for (auto [keepDqt, keepDht] : {std::pair{false, false}, {false, true}, {true, false}}) {
+        JpegBlockSpec bare = withTables;
+        bare.keepDqt = keepDqt;
+        bare.keepDht = keepDht;
+        Bytes data = BuildNitfJpegData({EncodeJpegBlock(pattern, bare)}, NitfApp6Spec {1, 1, 3, 0});
+        OpenedJpeg image(data, 1);
+        ASSERT_TRUE(image.opened) << keepDqt << keepDht;
+        EXPECT_EQ(image.Block(0), expected);
+
+        // Without a quality there is no default DQT; a DHT alone needs none.
+        data[2 + 20] = 0;
+        OpenedJpeg unqualified(data, 1);
+        EXPECT_EQ(unqualified.opened, keepDqt) << keepDqt << keepDht;
+    }
+}
+
+TEST(JpegDecode, LastBlockWithoutEndOfImageIsDamaged)
+{
+    JpegBlockSpec open;
+    open.keepEoi = false;
+    Bytes pattern = TestPattern(kSide, kSide, 1, 1);
+    Bytes data = BuildNitfJpegData({EncodeJpegBlock(pattern, {}), EncodeJpegBlock(pattern, open)}, {});
+    DecoderTestFile file(data);
+    CLeadToolLibWrapper decoder;
+    ASSERT_TRUE(decoder.PrepareJpeg(file.reader, kTestDataOffset, 0, 8));
+    try {
+        decoder.Open(file.reader, kTestDataOffset, 2, uint32_t(data.size()), 8, 1, 32, 16, false);
+        FAIL() << "no exception";
+    } catch (const std::runtime_error& error) {
+        EXPECT_STREQ(error.what(), kDamagedImageText);
+    }
+    // The first block stays decoded; a second Open without FreeBitmaps is refused.
+    Bytes row(kSide);
+    EXPECT_TRUE(decoder.GetRow(0, 0, 0, kSide - 1, kSide, row.data()));
+    EXPECT_THROW(decoder.Open(file.reader, kTestDataOffset, 2, 0, 8, 1, 32, 16, false), std::runtime_error);
+    decoder.FreeBitmaps();
+    EXPECT_FALSE(decoder.GetRow(0, 0, 0, kSide - 1, kSide, row.data()));
+}
+
+TEST(JpegDecode, ColourReachesTheCallerAsRgb)
+{
+    Bytes pattern = TestPattern(kSide, kSide, 3, 2);
+    for (bool rgbCoding : {false, true}) {
+        JpegBlockSpec spec;
+        spec.components = 3;
+        spec.rgbCoding = rgbCoding;
+        Bytes block = EncodeJpegBlock(pattern, spec);
+        OpenedJpeg image(BuildNitfJpegData({block}, NitfApp6Spec {1, 1, 0, uint8_t(rgbCoding ? 1 : 2)}), 1, 3);
+        ASSERT_TRUE(image.opened);
+        EXPECT_EQ(image.decoder.loaderConverted, 1);
+        EXPECT_EQ(image.Block(0, 3), DecodeWithLibjpeg(block, 3)) << "R,G,B coding " << rgbCoding;
+    }
+}
+
+TEST(JpegDecode, RowSpansStayWithinTheCallersBytes)
+{
+    Bytes data = BuildNitfJpegData({EncodeJpegBlock(TestPattern(kSide, kSide, 1, 3), {})}, {});
+    OpenedJpeg image(data, 1);
+    ASSERT_TRUE(image.opened);
+    Bytes full = image.Block(0);
+    Bytes span(12, 0xEE);
+    // Columns 10 to 15 of row 5: six bytes asked, the rest untouched.
+    ASSERT_TRUE(image.decoder.GetRow(0, 5, 10, 15, 6, span.data()));
+    EXPECT_EQ(Bytes(span.begin(), span.begin() + 6), Bytes(full.begin() + 5 * kSide + 10, full.begin() + 6 * kSide));
+    EXPECT_EQ(span[6], 0xEE);
+    // More bytes than the row holds from that column: only what is there.
+    Bytes wide(40, 0xEE);
+    ASSERT_TRUE(image.decoder.GetRow(0, 5, 10, 15, 40, wide.data()));
+    EXPECT_EQ(wide[6], 0xEE);
+    EXPECT_FALSE(image.decoder.GetRow(0, kSide, 0, 0, 1, wide.data()));
+    EXPECT_FALSE(image.decoder.GetRow(0, 0, kSide, kSide, 1, wide.data()));
+}
+
+TEST(JpegDecode, HostileStreamsFailCleanly)
+{
+    Bytes pattern = TestPattern(kSide, kSide, 1, 4);
+    // A frame larger than the block the caller gives.
+    JpegBlockSpec large;
+    large.width = large.height = 2 * kSide;
+    Bytes big = EncodeJpegBlock(TestPattern(2 * kSide, 2 * kSide, 1, 4), large);
+    EXPECT_FALSE(OpenedJpeg(BuildNitfJpegData({big}, {}), 1).opened);
+
+    // A frame header declaring 65535 x 65535 in a small stream, no block size given.
+    Bytes absurd = EncodeJpegBlock(pattern, {});
+    for (size_t at = 2; at + 8 < absurd.size(); ++at)
+        if (absurd[at] == 0xFF && absurd[at + 1] == 0xC0) {
+            absurd[at + 5] = absurd[at + 6] = absurd[at + 7] = absurd[at + 8] = 0xFF;
+            break;
+        }
+    {
+        Bytes data = BuildNitfJpegData({absurd}, {});
+        DecoderTestFile file(data);
+        CLeadToolLibWrapper decoder;
+        ASSERT_TRUE(decoder.PrepareJpeg(file.reader, kTestDataOffset, 0, 8));
+        EXPECT_FALSE(decoder.Open(file.reader, kTestDataOffset, 1, 0, 8, 1, kSide, kSide, false));
+    }
+
+    // Entropy-coded data overwritten: whatever libjpeg makes of it, no crash and no hang.
+    Bytes corrupt = EncodeJpegBlock(pattern, {});
+    for (size_t at = corrupt.size() - 40; at < corrupt.size() - 2; ++at)
+        corrupt[at] = uint8_t(at * 97);
+    OpenedJpeg damaged(BuildNitfJpegData({corrupt}, {}), 1);
+    Bytes row(kSide);
+    if (damaged.opened) {
+        EXPECT_TRUE(damaged.decoder.GetRow(0, 0, 0, kSide - 1, kSide, row.data()));
+    }
+
+    // More blocks than the data can hold: refused before anything is allocated.
+    Bytes one = BuildNitfJpegData({EncodeJpegBlock(pattern, {})}, {});
+    DecoderTestFile file(one);
+    CLeadToolLibWrapper decoder;
+    ASSERT_TRUE(decoder.PrepareJpeg(file.reader, kTestDataOffset, 0, 8));
+    EXPECT_FALSE(decoder.Open(file.reader, kTestDataOffset, 0xFFFFFFFF, 0, 8, 1, kSide, kSide, false));
+    EXPECT_EQ(decoder.bitmaps, nullptr);
+}
+
+TEST(JpegDecode, PreparationNeedsNitfApp6AndEightBitSamples)
+{
+    Bytes data = BuildNitfJpegData({EncodeJpegBlock(TestPattern(kSide, kSide, 1, 5), {})}, {});
+    DecoderTestFile file(data);
+    CLeadToolLibWrapper decoder;
+    EXPECT_FALSE(decoder.PrepareJpeg(file.reader, kTestDataOffset, 0, 12));
+    EXPECT_FALSE(decoder.PrepareJpeg(file.reader, kTestDataOffset, 0, 16));
+    EXPECT_FALSE(decoder.PrepareJpeg(file.reader, kTestDataOffset + 1, 0, 8));
+    EXPECT_FALSE(decoder.Open(file.reader, kTestDataOffset, 1, 0, 8, 1, kSide, kSide, false));
+    EXPECT_TRUE(decoder.PrepareJpeg(file.reader, kTestDataOffset, 0, 8));
+    EXPECT_FALSE(decoder.Open(file.reader, kTestDataOffset, 1, 0, 12, 1, kSide, kSide, false));
+
+    Bytes other = data;
+    other[2 + 4] = 'X';   // identifier "XITF"
+    DecoderTestFile otherFile(other);
+    CLeadToolLibWrapper otherDecoder;
+    EXPECT_FALSE(otherDecoder.PrepareJpeg(otherFile.reader, kTestDataOffset, 0, 8));
+    EXPECT_EQ(otherDecoder.kind, kNotPrepared);
+}
+
+TEST(JpegDecode, TableScanFindsTheFrameBehindAChunkBoundary)
+{
+    // A comment pushes the frame header across the first 100-byte read.
+    Bytes block = EncodeJpegBlock(TestPattern(kSide, kSide, 1, 6), {});
+    Bytes comment = {0xFF, 0xFE, 0x00, 0x5F};
+    comment.resize(0x5F + 2, 'c');
+    block.insert(block.begin() + 2, comment.begin(), comment.end());
+    DecoderTestFile file(block);
+    CLeadToolLibWrapper decoder;
+    bool hasDht = false, hasDqt = false;
+    uint32_t insertAt = 0, length = 0;
+    ASSERT_TRUE(decoder.ScanTableMarkers(file.reader, kTestDataOffset, hasDht, hasDqt, insertAt));
+    EXPECT_TRUE(hasDqt);
+    EXPECT_FALSE(hasDht);   // libjpeg writes its DHT after the frame header
+    EXPECT_EQ(block[insertAt], 0xFF);
+    EXPECT_EQ(block[insertAt + 1], 0xC0);
+    ASSERT_TRUE(decoder.FindEndOfImage(file.reader, kTestDataOffset, length));
+    EXPECT_EQ(length, block.size());
+}
+
+TEST(LosslessJpeg, EveryPredictorRestoresTheSamples)
+{
+    Bytes grey = TestPattern(kSide, kSide, 1, 8);
+    Bytes colour = TestPattern(kSide, kSide, 3, 9);
+    for (int predictor = 1; predictor <= 7; ++predictor) {
+        for (int components : {1, 3}) {
+            LosslessJpegSpec spec;
+            spec.components = components;
+            spec.predictor = predictor;
+            spec.restartRows = predictor == 4 ? 4 : 0;
+            const Bytes& pixels = components == 1 ? grey : colour;
+            OpenedJpeg image(BuildNitfJpegData({EncodeLosslessJpeg(pixels, spec)}, {}), 1, components);
+            ASSERT_TRUE(image.opened) << predictor << " " << components;
+            EXPECT_EQ(image.Block(0, components), pixels) << predictor << " " << components;
+        }
+    }
+}
+
+TEST(LosslessJpeg, PointTransformDropsTheLowBits)
+{
+    Bytes pixels = TestPattern(kSide, kSide, 1, 10);
+    LosslessJpegSpec spec;
+    spec.predictor = 6;
+    spec.pointTransform = 2;
+    OpenedJpeg image(BuildNitfJpegData({EncodeLosslessJpeg(pixels, spec)}, {}), 1);
+    ASSERT_TRUE(image.opened);
+    for (uint8_t& value : pixels)
+        value &= 0xFC;
+    EXPECT_EQ(image.Block(0), pixels);
+}
+
+TEST(LosslessJpeg, TruncatedAndCorruptStreamsFail)
+{
+    Bytes stream = EncodeLosslessJpeg(TestPattern(kSide, kSide, 1, 11), LosslessJpegSpec {});
+    Bytes truncated(stream.begin(), stream.begin() + stream.size() / 2);
+    truncated.insert(truncated.end(), {0xFF, 0xD9});
+    EXPECT_FALSE(OpenedJpeg(BuildNitfJpegData({truncated}, {}), 1).opened);
+    Bytes twelveBit = stream;
+    for (size_t at = 2; at + 4 < twelveBit.size(); ++at)
+        if (twelveBit[at] == 0xFF && twelveBit[at + 1] == 0xC3) {
+            twelveBit[at + 4] = 12;
+            break;
+        }
+    EXPECT_FALSE(OpenedJpeg(BuildNitfJpegData({twelveBit}, {}), 1).opened);
+}
+
+}  // namespace
