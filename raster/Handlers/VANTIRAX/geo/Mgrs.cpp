@@ -16,7 +16,7 @@ constexpr double kSquareSize = 100000.0;   // metres per square letter
 constexpr double kRowCycle = 2000000.0;    // the row letters repeat every 2 000 km
 
 enum Letter : int32_t {
-    kA = 0, kB = 1, kC = 2, kH = 7, kI = 8, kJ = 9, kO = 14, kR = 17, kS = 18,
+    kA = 0, kC = 2, kH = 7, kI = 8, kJ = 9, kO = 14, kR = 17, kS = 18,
     kV = 21, kX = 23, kZ = 25
 };
 constexpr int32_t kBand = 0;
