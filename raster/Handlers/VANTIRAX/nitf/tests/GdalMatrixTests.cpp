@@ -137,8 +137,9 @@ void CheckAgainstGdal(const MatrixCase& test, const std::string& version)
     LoadedImage loaded(nitf.c_str());
     ASSERT_TRUE(loaded.Open()) << test.name << " " << version;
     const CNitfImage& image = loaded.image;
-    if (test.options.find("IC=M3") != std::string::npos)
+    if (test.options.find("IC=M3") != std::string::npos) {
         EXPECT_TRUE(image.isMasked) << test.name; // blocks found through the mask's block table
+    }
     const std::vector<uint32_t> gdal = GdalSamples(dir, nitf, test.source.wide);
     const int32_t width = test.source.width, height = test.source.height, bands = test.source.bands;
     ASSERT_EQ(gdal.size(), size_t(width * height * bands)) << test.name;
