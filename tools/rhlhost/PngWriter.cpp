@@ -1,7 +1,9 @@
 #include "PngWriter.h"
 
+#include <cerrno>
 #include <csetjmp>
 #include <cstdio>
+#include <cstring>
 #include <png.h>
 
 namespace host {
@@ -37,18 +39,18 @@ bool WritePng(const std::string& path, uint32_t width, uint32_t height, unsigned
               const std::vector<uint8_t>& pixels, std::string& message)
 {
     if (width == 0 || height == 0) {
-        message = "nothing to write: the window is empty";
+        message = "the window is empty";
         return false;
     }
     FILE* file = std::fopen(path.c_str(), "wb");
     if (file == nullptr) {
-        message = "cannot write " + path;
+        message = std::strerror(errno);
         return false;
     }
     bool written = WriteRows(file, width, height, channels, pixels.data());
     written = std::fclose(file) == 0 && written;
     if (!written)
-        message = "PNG encoding of " + path + " failed";
+        message = "PNG encoding failed";
     return written;
 }
 

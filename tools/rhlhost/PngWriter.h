@@ -7,7 +7,7 @@
 
 namespace host {
 
-// pixels: height rows of width x channels bytes (channels 1 or 3).
+// pixels: height rows of width x channels bytes (channels 1 or 3). False with the reason.
 bool WritePng(const std::string& path, uint32_t width, uint32_t height, unsigned channels,
               const std::vector<uint8_t>& pixels, std::string& message);
 

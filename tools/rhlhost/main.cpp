@@ -3,11 +3,19 @@
 //
 //   rhlhost [--handler PATH] identify
 //   rhlhost [--handler PATH] probe FILE...
-//   rhlhost [--handler PATH] info FILE
+//   rhlhost [--handler PATH] info FILE [--text]
 //   rhlhost [--handler PATH] dump FILE OUT.raw [--window X0,Y0,X1,Y1]
-//   rhlhost [--handler PATH] render FILE OUT.png [--window X0,Y0,X1,Y1]
+//   rhlhost [--handler PATH] render FILE OUT.tif|OUT.png [--window X0,Y0,X1,Y1]
+//   rhlhost [--handler PATH] render [--jobs N] [--format tif|png] [--window X0,Y0,X1,Y1] -o OUTDIR FILE_OR_DIR...
+//   rhlhost [--handler PATH] mosaic -o OUT.tif FILE_OR_DIR...
+#include "Batch.h"
+#include "CommandLine.h"
+#include "Drawing.h"
+#include "ExitCodes.h"
 #include "HandlerLibrary.h"
-#include "PngWriter.h"
+#include "Info.h"
+#include "Mosaic.h"
+#include "Render.h"
 
 #include <cstdio>
 #include <cstring>
@@ -18,16 +26,15 @@ using namespace host;
 
 namespace {
 
-constexpr int kExitOk = 0;
-constexpr int kExitRefused = 1;
-constexpr int kExitUsage = 2;
-constexpr int kExitRowsFailed = 3;
-
-int Fail(int code, const std::string& message)
-{
-    std::fprintf(stderr, "rhlhost: %s\n", message.c_str());
-    return code;
-}
+constexpr const char* kUsage =
+    "usage: rhlhost [--handler PATH] COMMAND\n"
+    "  identify\n"
+    "  probe FILE...\n"
+    "  info FILE [--text]\n"
+    "  dump FILE OUT.raw [--window X0,Y0,X1,Y1]\n"
+    "  render FILE OUT.tif|OUT.png [--window X0,Y0,X1,Y1]\n"
+    "  render [--jobs N] [--format tif|png] [--window X0,Y0,X1,Y1] -o OUTDIR FILE_OR_DIR...\n"
+    "  mosaic -o OUT.tif FILE_OR_DIR...";
 
 // The directory of this executable, where the handler is built beside it.
 std::string DefaultHandlerPath(const char* argv0)
@@ -69,168 +76,65 @@ int Identify(const Exports& rh)
     return kExitOk;
 }
 
-int Probe(const Exports& rh, int count, char** files)
+int Probe(const Exports& rh, const std::vector<std::string>& files)
 {
-    for (int i = 0; i < count; ++i)
-        std::printf("%d %s\n", rh.isFormat(files[i]), files[i]);
+    for (const std::string& file : files)
+        std::printf("%d %s\n", rh.isFormat(file.c_str()), file.c_str());
     return kExitOk;
 }
 
-void PrintInfo(const OpenedImage& image)
-{
-    std::printf("{\"result\": %d, \"status\": %u, \"width\": %u, \"height\": %u, \"pixelKind\": %u, \"palette\": ",
-                image.result, image.status, image.width, image.height, image.pixelKind);
-    if (!image.hasPalette) {
-        std::printf("null");
-    } else {
-        std::printf("[");
-        for (size_t i = 0; i + 2 < image.palette.size(); i += 3)
-            std::printf("%s[%u, %u, %u]", i ? ", " : "", image.palette[i], image.palette[i + 1], image.palette[i + 2]);
-        std::printf("]");
-    }
-    std::printf(", \"georef\": ");
-    if (!image.hasGeoRef) {
-        std::printf("null");
-    } else {
-        std::printf("{\"epsg\": %u, \"points\": [", image.epsg);
-        for (size_t i = 0; i < image.points.size(); ++i) {
-            const ControlPoint& p = image.points[i];
-            std::printf("%s[%.17g, %.17g, %.17g, %.17g]", i ? ", " : "", p.column, p.row, p.x, p.y);
-        }
-        std::printf("]}");
-    }
-    std::printf("}\n");
-}
-
-// An open image, closed again when this object goes away.
-class OpenFile {
-public:
-    OpenFile(const Exports& rh, const char* path) : rh_(rh)
-    {
-        int32_t result = rh_.open(handle_.bytes, path);
-        image = ReadOpenedImage(handle_, result);
-    }
-    ~OpenFile() { rh_.close(handle_.bytes); }
-    bool Ready() const { return image.result == 1 && image.status == 0; }
-    HandleRecord& Handle() { return handle_; }
-
-    OpenedImage image;
-
-private:
-    const Exports& rh_;
-    HandleRecord handle_;
-};
-
-int Info(const Exports& rh, const char* path)
+int Info(const Exports& rh, const std::string& path, bool asText)
 {
     OpenFile file(rh, path);
-    PrintInfo(file.image);
+    if (asText)
+        PrintInfoText(path, file.image);
+    else
+        PrintInfoJson(file.image);
     return file.Ready() ? kExitOk : kExitRefused;
 }
 
-struct Window {
-    int32_t x0 = 0, y0 = 0, x1 = -1, y1 = -1; // x1, y1 exclusive; -1: the image's edge
-};
-
-bool ParseWindow(const char* text, Window& window)
+int RenderOne(const Exports& rh, const std::string& input, const std::string& output, OutputFormat format,
+              const Window& window)
 {
-    char tail = '\0';
-    return std::sscanf(text, "%d,%d,%d,%d%c", &window.x0, &window.y0, &window.x1, &window.y1, &tail) == 4 &&
-           window.x0 >= 0 && window.y0 >= 0 && window.x1 > window.x0 && window.y1 > window.y0;
-}
-
-struct Pixels {
-    uint32_t width = 0, height = 0;
-    size_t bytesPerPixel = 1;
-    std::vector<uint8_t> bytes;
-    uint32_t failedRows = 0;
-};
-
-// Draws the window row by row exactly as RH_GetLine delivers it; rows that fail stay zero.
-bool DrawWindow(const Exports& rh, OpenFile& file, Window window, Pixels& pixels, std::string& message)
-{
-    if (window.x1 < 0)
-        window.x1 = static_cast<int32_t>(file.image.width);
-    if (window.y1 < 0)
-        window.y1 = static_cast<int32_t>(file.image.height);
-    if (window.x1 > int32_t(file.image.width) || window.y1 > int32_t(file.image.height) || window.x1 <= window.x0 ||
-        window.y1 <= window.y0) {
-        message = "the window lies outside the image";
-        return false;
-    }
-    const int32_t rect[4] = {window.x0, window.y0, window.x1, window.y1};
-    uint32_t rowWidth = 0;
-    if (rh.startDraw(file.Handle().bytes, nullptr, rect, 1.0, &rowWidth) != 1) {
-        message = "the handler refused to start the draw";
-        return false;
-    }
-    pixels.width = rowWidth;
-    pixels.height = static_cast<uint32_t>(window.y1 - window.y0);
-    pixels.bytesPerPixel = BytesPerPixel(file.image.pixelKind);
-    const size_t rowBytes = size_t(rowWidth) * pixels.bytesPerPixel;
-    pixels.bytes.assign(rowBytes * pixels.height, 0);
-    for (uint32_t i = 0; i < pixels.height; ++i) {
-        uint8_t* row = nullptr;
-        uint16_t flag = 0;
-        if (rh.getLine(file.Handle().bytes, uint32_t(window.y0) + i, &row, &flag) == 1 && row != nullptr)
-            std::memcpy(pixels.bytes.data() + i * rowBytes, row, rowBytes);
-        else
-            ++pixels.failedRows;
-    }
-    rh.endDraw(file.Handle().bytes);
-    return true;
-}
-
-// Expands palette indices to RGB (or keeps grey / RGB rows as they are).
-unsigned ToDisplay(const OpenedImage& image, const Pixels& pixels, std::vector<uint8_t>& display)
-{
-    if (pixels.bytesPerPixel == 3 || image.palette.empty()) {
-        display = pixels.bytes;
-        return static_cast<unsigned>(pixels.bytesPerPixel);
-    }
-    const size_t entries = image.palette.size() / 3;
-    display.resize(pixels.bytes.size() * 3);
-    for (size_t i = 0; i < pixels.bytes.size(); ++i) {
-        size_t index = pixels.bytes[i] < entries ? pixels.bytes[i] : 0;
-        std::memcpy(&display[i * 3], &image.palette[index * 3], 3);
-    }
-    return 3;
-}
-
-int Draw(const Exports& rh, const char* path, const char* output, const Window& window, bool asPng)
-{
-    OpenFile file(rh, path);
-    if (!file.Ready())
-        return Fail(kExitRefused, std::string(path) + ": refused by the handler (result " +
-                                      std::to_string(file.image.result) + ", status " +
-                                      std::to_string(file.image.status) + ")");
-    Pixels pixels;
-    std::string message;
-    if (!DrawWindow(rh, file, window, pixels, message))
-        return Fail(kExitRefused, std::string(path) + ": " + message);
-    if (asPng) {
-        std::vector<uint8_t> display;
-        unsigned channels = ToDisplay(file.image, pixels, display);
-        if (!WritePng(output, pixels.width, pixels.height, channels, display, message))
-            return Fail(kExitRefused, message);
-    } else {
-        FILE* out = std::fopen(output, "wb");
-        if (out == nullptr)
-            return Fail(kExitRefused, std::string("cannot write ") + output);
-        bool written = std::fwrite(pixels.bytes.data(), 1, pixels.bytes.size(), out) == pixels.bytes.size();
-        if (std::fclose(out) != 0 || !written)
-            return Fail(kExitRefused, std::string("cannot write ") + output);
-    }
-    if (pixels.failedRows > 0)
-        return Fail(kExitRowsFailed, std::string(path) + ": " + std::to_string(pixels.failedRows) +
+    RenderOutcome outcome = RenderFile(rh, input, output, format, window);
+    if (!outcome.warning.empty())
+        std::fprintf(stderr, "rhlhost: %s: %s\n", input.c_str(), outcome.warning.c_str());
+    if (outcome.status == RenderStatus::Refused)
+        return Fail(kExitRefused, input + ": " + outcome.message);
+    if (outcome.status == RenderStatus::Failed)
+        return Fail(kExitRefused, outcome.message);
+    if (outcome.failedRows > 0)
+        return Fail(kExitRowsFailed, input + ": " + std::to_string(outcome.failedRows) +
                                          " rows could not be decoded (written as zeros)");
     return kExitOk;
 }
 
-int Usage()
+int Render(const Exports& rh, const CommandLine& line, bool raw)
 {
-    return Fail(kExitUsage, "usage: rhlhost [--handler PATH] identify | probe FILE... | info FILE | "
-                            "dump FILE OUT.raw [--window X0,Y0,X1,Y1] | render FILE OUT.png [--window X0,Y0,X1,Y1]");
+    if (!line.output.empty() && !raw)
+        return RunBatch(rh, BatchOptionsFrom(line));
+    if (line.positional.size() != 2)
+        return Fail(kExitUsage, kUsage);
+    OutputFormat format = OutputFormat::Raw;
+    if (!raw && !FormatFromName(line.positional[1], format))
+        return Fail(kExitUsage, "render writes .tif, .tiff or .png files");
+    return RenderOne(rh, line.positional[0], line.positional[1], format, line.window);
+}
+
+int Run(const Exports& rh, const std::string& command, const CommandLine& line)
+{
+    const std::vector<std::string>& args = line.positional;
+    if (command == "identify" && args.empty())
+        return Identify(rh);
+    if (command == "probe" && !args.empty())
+        return Probe(rh, args);
+    if (command == "info" && args.size() == 1)
+        return Info(rh, args[0], line.text);
+    if (command == "dump" || command == "render")
+        return Render(rh, line, command == "dump");
+    if (command == "mosaic" && !args.empty() && !line.output.empty())
+        return RunMosaic(rh, args, line.output);
+    return Fail(kExitUsage, kUsage);
 }
 
 } // namespace
@@ -244,26 +148,15 @@ int main(int argc, char** argv)
         next += 2;
     }
     if (next >= argc)
-        return Usage();
+        return Fail(kExitUsage, kUsage);
     const std::string command = argv[next++];
-    std::vector<char*> args(argv + next, argv + argc);
-
-    Exports rh{};
+    CommandLine line;
     std::string message;
-    if (!LoadHandler(handlerPath, rh, message))
+    if (!ParseCommandLine(std::vector<std::string>(argv + next, argv + argc), line, message))
         return Fail(kExitUsage, message);
 
-    if (command == "identify" && args.empty())
-        return Identify(rh);
-    if (command == "probe" && !args.empty())
-        return Probe(rh, static_cast<int>(args.size()), args.data());
-    if (command == "info" && args.size() == 1)
-        return Info(rh, args[0]);
-    if ((command == "dump" || command == "render") && (args.size() == 2 || args.size() == 4)) {
-        Window window;
-        if (args.size() == 4 && (std::strcmp(args[2], "--window") != 0 || !ParseWindow(args[3], window)))
-            return Fail(kExitUsage, "--window takes X0,Y0,X1,Y1 with X1 > X0 and Y1 > Y0");
-        return Draw(rh, args[0], args[1], window, command == "render");
-    }
-    return Usage();
+    Exports rh{};
+    if (!LoadHandler(handlerPath, rh, message))
+        return Fail(kExitUsage, message);
+    return Run(rh, command, line);
 }

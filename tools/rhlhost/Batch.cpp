@@ -1,0 +1,194 @@
+#include "Batch.h"
+
+#include "ExitCodes.h"
+#include "FileWalk.h"
+#include "OutputFile.h"
+#include "Progress.h"
+#include "Render.h"
+
+#include <atomic>
+#include <cstdio>
+#include <filesystem>
+#include <thread>
+#include <unistd.h>
+
+namespace host {
+namespace {
+
+namespace fs = std::filesystem;
+
+enum class FileResult { Rendered, NotRecognised, NotOpened, Vanished, Failed };
+
+struct FileOutcome {
+    FileResult result = FileResult::Rendered;
+    uint32_t failedRows = 0;
+};
+
+struct Summary {
+    size_t files = 0, rendered = 0, withFailedRows = 0, failedRows = 0;
+    size_t notRecognised = 0, notOpened = 0, vanished = 0, failed = 0;
+};
+
+bool Exists(const std::string& path)
+{
+    std::error_code error;
+    return fs::exists(path, error);
+}
+
+class Batch {
+public:
+    Batch(const Exports& rh, const BatchOptions& options, std::vector<InputFile> files)
+        : rh_(rh), options_(options), files_(std::move(files)), outcomes_(files_.size()), progress_(files_.size())
+    {
+        OutputFormat format = OutputFormat::GeoTiff;
+        FormatFromName(options_.extension, format);
+        format_ = format;
+    }
+
+    void Run()
+    {
+        std::vector<std::thread> workers;
+        for (unsigned i = 0; i < options_.jobs; ++i)
+            workers.emplace_back([this] { Work(); });
+        for (std::thread& worker : workers)
+            worker.join();
+        progress_.Finish();
+    }
+
+    Progress& Reporter() { return progress_; }
+    const std::vector<FileOutcome>& Outcomes() const { return outcomes_; }
+
+private:
+    void Work()
+    {
+        for (size_t i = next_++; i < files_.size(); i = next_++) {
+            outcomes_[i] = Process(files_[i]);
+            progress_.Advance();
+        }
+    }
+
+    FileOutcome Process(const InputFile& file)
+    {
+        if (rh_.isFormat(file.path.c_str()) != 1)
+            return Exists(file.path) ? FileOutcome{FileResult::NotRecognised, 0} : Vanished(file);
+        const fs::path output = fs::path(options_.outputDirectory) / (file.name + options_.extension);
+        std::error_code error;
+        fs::create_directories(output.parent_path(), error);
+        if (error) {
+            progress_.Report("cannot create the directory " + output.parent_path().string() + ": " + error.message());
+            return {FileResult::Failed, 0};
+        }
+        return Rendered(file, RenderFile(rh_, file.path, output.string(), format_, options_.window));
+    }
+
+    FileOutcome Rendered(const InputFile& file, const RenderOutcome& outcome)
+    {
+        if (!outcome.warning.empty())
+            progress_.Report(file.path + ": " + outcome.warning);
+        if (outcome.status == RenderStatus::Failed) {
+            progress_.Report(outcome.message);
+            return {FileResult::Failed, 0};
+        }
+        if (outcome.status == RenderStatus::Refused) {
+            if (!Exists(file.path))
+                return Vanished(file);
+            progress_.Report(file.path + ": " + outcome.message);
+            return {FileResult::NotOpened, 0};
+        }
+        if (outcome.failedRows > 0)
+            progress_.Report(file.path + ": " + std::to_string(outcome.failedRows) +
+                             " rows could not be decoded (written as zeros)");
+        return {FileResult::Rendered, outcome.failedRows};
+    }
+
+    FileOutcome Vanished(const InputFile& file)
+    {
+        progress_.Report(file.path + ": the file no longer exists");
+        return {FileResult::Vanished, 0};
+    }
+
+    const Exports& rh_;
+    const BatchOptions& options_;
+    const std::vector<InputFile> files_;
+    std::vector<FileOutcome> outcomes_;
+    Progress progress_;
+    OutputFormat format_;
+    std::atomic<size_t> next_{0};
+};
+
+Summary Summarise(const std::vector<FileOutcome>& outcomes)
+{
+    Summary s;
+    s.files = outcomes.size();
+    for (const FileOutcome& outcome : outcomes) {
+        switch (outcome.result) {
+        case FileResult::Rendered:
+            ++s.rendered;
+            s.withFailedRows += outcome.failedRows > 0;
+            s.failedRows += outcome.failedRows;
+            break;
+        case FileResult::NotRecognised:
+            ++s.notRecognised;
+            break;
+        case FileResult::NotOpened:
+            ++s.notOpened;
+            break;
+        case FileResult::Vanished:
+            ++s.vanished;
+            break;
+        case FileResult::Failed:
+            ++s.failed;
+            break;
+        }
+    }
+    return s;
+}
+
+std::string SummaryLine(const Summary& s)
+{
+    return std::to_string(s.files) + " files: " + std::to_string(s.rendered) + " rendered (" +
+           std::to_string(s.withFailedRows) + " with " + std::to_string(s.failedRows) + " undecodable rows), " +
+           std::to_string(s.notRecognised + s.notOpened + s.vanished) + " refused (" +
+           std::to_string(s.notRecognised) + " not recognised, " + std::to_string(s.notOpened) + " not opened, " +
+           std::to_string(s.vanished) + " vanished), " + std::to_string(s.failed) + " failed to write";
+}
+
+int ExitCode(const Summary& s, size_t problems)
+{
+    if (s.notOpened + s.vanished + s.failed + problems > 0)
+        return kExitRefused;
+    return s.failedRows > 0 ? kExitRowsFailed : kExitOk;
+}
+
+} // namespace
+
+BatchOptions BatchOptionsFrom(const CommandLine& line)
+{
+    BatchOptions options;
+    options.inputs = line.positional;
+    options.outputDirectory = line.output;
+    options.extension = "." + line.format;
+    options.jobs = line.jobs;
+    options.window = line.window;
+    return options;
+}
+
+int RunBatch(const Exports& rh, const BatchOptions& options)
+{
+    std::error_code error;
+    fs::create_directories(options.outputDirectory, error);
+    if (error)
+        return Fail(kExitRefused, "cannot create " + options.outputDirectory + ": " + error.message());
+    if (access(options.outputDirectory.c_str(), W_OK) != 0)
+        return Fail(kExitRefused, CannotWrite(options.outputDirectory));
+    std::vector<std::string> problems;
+    Batch batch(rh, options, CollectInputs(options.inputs, problems));
+    for (const std::string& problem : problems)
+        batch.Reporter().Report(problem);
+    batch.Run();
+    const Summary summary = Summarise(batch.Outcomes());
+    std::fprintf(stderr, "rhlhost: %s\n", SummaryLine(summary).c_str());
+    return ExitCode(summary, problems.size());
+}
+
+} // namespace host

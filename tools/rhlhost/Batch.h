@@ -1,0 +1,25 @@
+// Renders many files on worker threads, one handle per file: every file the
+// handler recognises goes to OUTDIR/NAME.tif (or .png), NAME being its path
+// relative to the directory it was found in. A refused, damaged or vanished
+// file is reported and skipped; it never stops the batch.
+#pragma once
+
+#include "CommandLine.h"
+#include "HandlerLibrary.h"
+
+namespace host {
+
+struct BatchOptions {
+    std::vector<std::string> inputs;
+    std::string outputDirectory;
+    std::string extension = ".tif";
+    unsigned jobs = 1;
+    Window window;
+};
+
+BatchOptions BatchOptionsFrom(const CommandLine& line);
+
+// Prints a line per problem and a one-line summary on stderr; the exit code.
+int RunBatch(const Exports& rh, const BatchOptions& options);
+
+} // namespace host

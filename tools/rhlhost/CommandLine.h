@@ -1,0 +1,23 @@
+// The options that follow a command, in any order among its file arguments.
+#pragma once
+
+#include "Drawing.h"
+
+#include <string>
+#include <vector>
+
+namespace host {
+
+struct CommandLine {
+    std::vector<std::string> positional;
+    Window window;               // --window X0,Y0,X1,Y1
+    std::string output;          // -o PATH: the batch's output directory, or the mosaic file
+    unsigned jobs = 1;           // --jobs N
+    std::string format = "tif";  // --format tif|png
+    bool text = false;           // --text
+};
+
+// False with a message on an unknown option or a bad value.
+bool ParseCommandLine(const std::vector<std::string>& args, CommandLine& line, std::string& message);
+
+} // namespace host

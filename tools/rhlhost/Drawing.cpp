@@ -1,0 +1,78 @@
+#include "Drawing.h"
+
+#include <cstdio>
+#include <cstring>
+
+namespace host {
+namespace {
+
+// Replaces the -1 edges by the image's size; false when the window leaves the image.
+bool ResolveWindow(const OpenedImage& image, Window& window)
+{
+    if (window.x1 < 0)
+        window.x1 = static_cast<int32_t>(image.width);
+    if (window.y1 < 0)
+        window.y1 = static_cast<int32_t>(image.height);
+    return window.x1 <= int32_t(image.width) && window.y1 <= int32_t(image.height) && window.x1 > window.x0 &&
+           window.y1 > window.y0;
+}
+
+} // namespace
+
+bool ParseWindow(const char* text, Window& window)
+{
+    char tail = '\0';
+    return std::sscanf(text, "%d,%d,%d,%d%c", &window.x0, &window.y0, &window.x1, &window.y1, &tail) == 4 &&
+           window.x0 >= 0 && window.y0 >= 0 && window.x1 > window.x0 && window.y1 > window.y0;
+}
+
+OpenFile::OpenFile(const Exports& rh, const std::string& path) : rh_(rh)
+{
+    int32_t result = rh_.open(handle_.bytes, path.c_str());
+    image = ReadOpenedImage(handle_, result);
+}
+
+OpenFile::~OpenFile()
+{
+    rh_.close(handle_.bytes);
+}
+
+std::string OpenFile::RefusalReason() const
+{
+    return "the handler could not open it (result " + std::to_string(image.result) + ", status " +
+           std::to_string(image.status) + ")";
+}
+
+bool DrawWindow(const Exports& rh, OpenFile& file, Window window, Pixels& pixels, std::string& message)
+{
+    if (!ResolveWindow(file.image, window)) {
+        message = "the window lies outside the " + std::to_string(file.image.width) + " x " +
+                  std::to_string(file.image.height) + " image";
+        return false;
+    }
+    const int32_t rect[4] = {window.x0, window.y0, window.x1, window.y1};
+    uint32_t rowWidth = 0;
+    if (rh.startDraw(file.Handle().bytes, nullptr, rect, 1.0, &rowWidth) != 1) {
+        message = "the handler refused to start the draw";
+        return false;
+    }
+    pixels.x0 = uint32_t(window.x0);
+    pixels.y0 = uint32_t(window.y0);
+    pixels.width = rowWidth;
+    pixels.height = static_cast<uint32_t>(window.y1 - window.y0);
+    pixels.bytesPerPixel = BytesPerPixel(file.image.pixelKind);
+    const size_t rowBytes = size_t(rowWidth) * pixels.bytesPerPixel;
+    pixels.bytes.assign(rowBytes * pixels.height, 0);
+    for (uint32_t i = 0; i < pixels.height; ++i) {
+        uint8_t* row = nullptr;
+        uint16_t flag = 0;
+        if (rh.getLine(file.Handle().bytes, pixels.y0 + i, &row, &flag) == 1 && row != nullptr)
+            std::memcpy(pixels.bytes.data() + i * rowBytes, row, rowBytes);
+        else
+            ++pixels.failedRows;
+    }
+    rh.endDraw(file.Handle().bytes);
+    return true;
+}
+
+} // namespace host

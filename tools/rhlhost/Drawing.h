@@ -1,0 +1,53 @@
+// Opening a file through the handler and drawing a window of it row by row,
+// exactly as RH_GetLine delivers the rows.
+#pragma once
+
+#include "HandlerLibrary.h"
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+namespace host {
+
+// A window of the image; x1 and y1 are exclusive, -1 stands for the image's edge.
+struct Window {
+    int32_t x0 = 0, y0 = 0, x1 = -1, y1 = -1;
+};
+
+// "X0,Y0,X1,Y1" with X1 > X0 >= 0 and Y1 > Y0 >= 0.
+bool ParseWindow(const char* text, Window& window);
+
+// An open image, closed again when this object goes away.
+class OpenFile {
+public:
+    OpenFile(const Exports& rh, const std::string& path);
+    ~OpenFile();
+    OpenFile(const OpenFile&) = delete;
+    OpenFile& operator=(const OpenFile&) = delete;
+
+    // RH_Open succeeded: result 1 and status 0.
+    bool Ready() const { return image.result == 1 && image.status == 0; }
+    // Why the open failed, for messages.
+    std::string RefusalReason() const;
+    HandleRecord& Handle() { return handle_; }
+
+    OpenedImage image;
+
+private:
+    const Exports& rh_;
+    HandleRecord handle_;
+};
+
+// Rows of a drawn window as delivered; rows that failed to decode stay zero.
+struct Pixels {
+    uint32_t x0 = 0, y0 = 0; // the window's place in the image
+    uint32_t width = 0, height = 0;
+    size_t bytesPerPixel = 1;
+    std::vector<uint8_t> bytes;
+    uint32_t failedRows = 0;
+};
+
+bool DrawWindow(const Exports& rh, OpenFile& file, Window window, Pixels& pixels, std::string& message);
+
+} // namespace host

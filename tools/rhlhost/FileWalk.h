@@ -1,0 +1,20 @@
+// The files a batch or mosaic works on: files named on the command line and
+// every regular file below the directories named there.
+#pragma once
+
+#include <string>
+#include <vector>
+
+namespace host {
+
+struct InputFile {
+    std::string path;
+    std::string name; // relative to the directory it was found in; a named file's own name
+};
+
+// Directories are walked recursively and their files sorted; a named path that
+// is not a directory is kept as it is, even when it does not exist, so that
+// the caller reports it. Directories that cannot be read become problems.
+std::vector<InputFile> CollectInputs(const std::vector<std::string>& inputs, std::vector<std::string>& problems);
+
+} // namespace host

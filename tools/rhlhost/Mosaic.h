@@ -1,0 +1,17 @@
+// Places the frames of a CADRG or CIB product (EPSG 4326, north up, one
+// scale) by their corners onto one grid and writes it as one GeoTIFF: with
+// the frames' shared palette and the masked value as nodata, or as RGB with
+// alpha when the frames' colours differ. Frames that cannot be placed are
+// refused with a message; the others are still placed.
+#pragma once
+
+#include "HandlerLibrary.h"
+
+#include <string>
+#include <vector>
+
+namespace host {
+
+int RunMosaic(const Exports& rh, const std::vector<std::string>& inputs, const std::string& output);
+
+} // namespace host
