@@ -1,13 +1,11 @@
 #include "imaging/FileLoader.h"
 
 #include "imaging/BitmapKernel.h"
+#include "plugin/FileCalls.h"
 
-#include <cerrno>
 #include <cstdlib>
 #include <memory>
 #include <new>
-#include <sys/stat.h>
-#include <unistd.h>
 
 namespace {
 
@@ -100,20 +98,6 @@ int Decode(const LoadRequest& request)
     return kLoadSucceeded;
 }
 
-bool ReadAt(int fileHandle, uint64_t offset, uint8_t* buffer, uint32_t count)
-{
-    uint32_t done = 0;
-    while (done < count) {
-        ssize_t got = ::pread(fileHandle, buffer + done, count - done, static_cast<off_t>(offset + done));
-        if (got < 0 && errno == EINTR)
-            continue;
-        if (got <= 0)
-            return false;
-        done += static_cast<uint32_t>(got);
-    }
-    return true;
-}
-
 }  // namespace
 
 int L_GetDefaultLoadFileOption(LOADFILEOPTION* options, uint32_t structSize)
@@ -139,12 +123,14 @@ int L_LoadFileOffset(int fileHandle, uint64_t offset, uint32_t byteCount, BITMAP
                      int bitsPerPixel, int order, uint32_t flags, LoadProgress progress, void* userData,
                      const LOADFILEOPTION* options, FILEINFO* info)
 {
-    struct stat file {};
-    if (fileHandle < 0 || ::fstat(fileHandle, &file) != 0 || file.st_size < 0 ||
-        offset > uint64_t(file.st_size) || byteCount > uint64_t(file.st_size) - offset)
+    if (fileHandle <= 0)
+        return kLoadFailed;
+    uint32_t handle = static_cast<uint32_t>(fileHandle);
+    uint64_t fileSize = filecalls::Size(handle);
+    if (offset > fileSize || byteCount > fileSize - offset)
         return kLoadFailed;
     std::unique_ptr<uint8_t[]> stream(new (std::nothrow) uint8_t[byteCount == 0 ? 1 : byteCount]);
-    if (!stream || !ReadAt(fileHandle, offset, stream.get(), byteCount))
+    if (!stream || !filecalls::ReadAt(handle, offset, stream.get(), byteCount))
         return kLoadFailed;
     return L_LoadMemory(stream.get(), bitmap, structSize, bitsPerPixel, order, flags, progress, userData, byteCount,
                         options, info);

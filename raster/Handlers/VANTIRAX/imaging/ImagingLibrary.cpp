@@ -8,26 +8,6 @@
 const char* const kKernelModuleName = "LTKRNX.DLL";
 const char* const kFileModuleName = "LTFILX.DLL";
 
-LTGuard::LTGuard()
-{
-    pthread_mutex_init(&section, nullptr);
-}
-
-LTGuard::~LTGuard()
-{
-    pthread_mutex_destroy(&section);
-}
-
-void LTGuard::Enter()
-{
-    pthread_mutex_lock(&section);
-}
-
-void LTGuard::Leave()
-{
-    pthread_mutex_unlock(&section);
-}
-
 namespace {
 
 template <typename Function>

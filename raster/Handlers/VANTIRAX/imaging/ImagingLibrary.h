@@ -5,7 +5,11 @@
 #include "imaging/ImagingRecords.h"
 
 #include <cstddef>
+#ifdef _WIN32
+#include <windows.h>
+#else
 #include <pthread.h>
+#endif
 
 // The lock of the binding. One global instance lives from load to unload.
 class LTGuard {
@@ -18,7 +22,11 @@ public:
     void Leave();
 
 private:
+#ifdef _WIN32
+    CRITICAL_SECTION section;
+#else
     pthread_mutex_t section;
+#endif
 };
 
 // Module look-up: a module is a named table of named entry points.

@@ -7,7 +7,11 @@
 
 #include <cstring>
 
+#ifdef _WIN32
+#define RH_EXPORT extern "C" __declspec(dllexport)
+#else
 #define RH_EXPORT extern "C" __attribute__((visibility("default")))
+#endif
 
 namespace {
 
