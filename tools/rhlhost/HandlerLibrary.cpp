@@ -1,7 +1,8 @@
 #include "HandlerLibrary.h"
 
+#include "PlatformLibrary.h"
+
 #include <cstring>
-#include <dlfcn.h>
 
 namespace host {
 namespace {
@@ -34,7 +35,7 @@ T Read(const void* base, size_t offset)
 template <typename T>
 bool Bind(void* library, const char* name, T& function, std::string& message)
 {
-    void* symbol = dlsym(library, name);
+    void* symbol = FindExport(library, name);
     if (symbol == nullptr) {
         message = std::string("export ") + name + " is missing";
         return false;
@@ -47,10 +48,10 @@ bool Bind(void* library, const char* name, T& function, std::string& message)
 
 bool LoadHandler(const std::string& path, Exports& exports, std::string& message)
 {
-    void* library = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
+    std::string reason;
+    void* library = OpenLibrary(path, reason);
     if (library == nullptr) {
-        const char* reason = dlerror();
-        message = "cannot load handler " + path + ": " + (reason ? reason : "unknown error");
+        message = "cannot load handler " + path + ": " + reason;
         return false;
     }
     return Bind(library, "RH_IsFormat", exports.isFormat, message) &&
