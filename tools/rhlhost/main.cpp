@@ -40,7 +40,7 @@ constexpr const char* kUsage =
 std::string DefaultHandlerPath(const char* argv0)
 {
     std::string self = argv0;
-    size_t slash = self.rfind('/');
+    size_t slash = self.find_last_of("/\\");   // Windows passes backslashes
     std::string directory = slash == std::string::npos ? "." : self.substr(0, slash);
     return directory + "/" VX_DEFAULT_HANDLER;
 }
