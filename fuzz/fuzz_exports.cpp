@@ -1,0 +1,72 @@
+// The whole export sequence on one input file, as a host drives it: probe,
+// open, one draw over the full width, every row up to a pixel budget, end of
+// draw, close. The exports are linked in, not loaded.
+#include "FuzzFile.h"
+#include "plugin/HostRecords.h"
+
+#include <algorithm>
+#include <string>
+
+extern "C" {
+int32_t RH_IsFormat(const char* path);
+int32_t RH_Open(RHHandle* handle, const char* path);
+int32_t RH_StartDraw(RHHandle* handle, void* hostContext, const int32_t* rect, double scale, uint32_t* rowWidth);
+int32_t RH_GetLine(RHHandle* handle, uint32_t row, uint8_t** rowAddress, uint16_t* lineFlag);
+int32_t RH_EndDraw(RHHandle* handle);
+int32_t RH_Close(RHHandle* handle);
+}
+
+namespace {
+
+constexpr uint64_t kPixelBudget = 1u << 20; // pixels drawn per input
+constexpr uint32_t kMaxRows = 4096;
+
+void Draw(RHHandle& handle)
+{
+    const uint32_t width = handle.width;
+    if (width > uint32_t(INT32_MAX))
+        return;
+    const int32_t rect[4] = {0, 0, int32_t(width), int32_t(std::min<uint32_t>(handle.height, INT32_MAX))};
+    uint32_t rowWidth = 0;
+    if (RH_StartDraw(&handle, nullptr, rect, 1.0, &rowWidth) != 1)
+        return;
+    const uint64_t budgetRows = kPixelBudget / std::max<uint32_t>(width, 1);
+    const uint32_t rows = uint32_t(std::min<uint64_t>({handle.height, budgetRows, kMaxRows}));
+    const size_t rowBytes = size_t(rowWidth) * (handle.pixelKind == kPixelDirect ? 3 : 1);
+    volatile uint8_t sink = 0;
+    for (uint32_t row = 0; row < rows && handle.handler != nullptr; ++row) {
+        uint8_t* address = nullptr;
+        uint16_t flag = 0;
+        if (RH_GetLine(&handle, row, &address, &flag) == 1 && address != nullptr && rowBytes > 0)
+            sink = sink ^ address[0] ^ address[rowBytes - 1]; // the whole row must be addressable
+    }
+    if (handle.handler != nullptr)
+        RH_EndDraw(&handle);
+}
+
+} // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size)
+{
+    std::basic_string<uint8_t> input(data, size);
+    DeclareInputLength(input.data(), input.size());
+    if (!WriteFuzzFile(input.data(), input.size()))
+        return 0;
+    const char* path = FuzzFilePath().c_str();
+    RH_IsFormat(path);
+
+    RHHandle handle{};
+    const int32_t opened = RH_Open(&handle, path);
+    if (handle.handler == nullptr)
+        return 0;
+    if (opened == 1 && handle.status == kStatusOk) {
+        if (handle.palette != nullptr && handle.palette->entryCount > 0) {
+            volatile uint8_t last = handle.palette->entries[size_t(handle.palette->entryCount) * 3 - 1];
+            (void)last;
+        }
+        Draw(handle);
+    }
+    if (handle.handler != nullptr)
+        RH_Close(&handle);
+    return 0;
+}
