@@ -1,0 +1,90 @@
+#include "HostSamples.h"
+
+#include "tests/fixtures/NitfFileWriter.h"
+#include "tests/fixtures/NitfImageWriter.h"
+
+#include <cstdio>
+
+namespace {
+
+constexpr int32_t kUtmColumns = 40, kUtmRows = 30;
+constexpr int32_t kGreyColumns = 20, kGreyRows = 10;
+
+uint64_t Pattern(int32_t band, int32_t row, int32_t column)
+{
+    return uint64_t(band * 80 + row * 5 + column * 3) & 0xFF;
+}
+
+std::string UtmSlot(double easting, double northing)
+{
+    char slot[16];
+    std::snprintf(slot, sizeof slot, "33%06.0f%07.0f", easting, northing);
+    return slot;
+}
+
+std::string DegreeSlot(double latitude, double longitude)
+{
+    char slot[16];
+    std::snprintf(slot, sizeof slot, "%+07.3f%+08.3f", latitude, longitude);
+    return slot;
+}
+
+std::string ImageFile(const NitfImageSpec& spec)
+{
+    return BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, Pattern)));
+}
+
+} // namespace
+
+std::string FrameFile(const RpfCorners& corners, RpfProduct product, const std::set<uint32_t>& maskedSubframes)
+{
+    RpfFrameSpec spec;
+    spec.product = product;
+    spec.indexImage = PatternIndexImage();
+    spec.corners = corners;
+    spec.maskedSubframes = maskedSubframes;
+    return BuildRpfFrame(spec).bytes;
+}
+
+std::string SmallFrameFile(const RpfCorners& corners)
+{
+    std::set<uint32_t> masked;
+    for (uint32_t subframe = 1; subframe < kRpfSubframeCount; ++subframe)
+        masked.insert(subframe);
+    return FrameFile(corners, RpfProduct::Cadrg, masked);
+}
+
+std::string UtmRgbImage()
+{
+    NitfImageSpec spec;
+    spec.rows = kUtmRows;
+    spec.columns = kUtmColumns;
+    spec.IREP = "RGB";
+    spec.bands = {NitfBandSpec{"R", 0, 0, ""}, NitfBandSpec{"G", 0, 0, ""}, NitfBandSpec{"B", 0, 0, ""}};
+    spec.IMODE = 'P';
+    spec.ICORDS = 'N';
+    const double east = kUtmWest + kUtmColumns * kUtmPixel;
+    const double south = kUtmNorth - kUtmRows * kUtmPixel;
+    spec.IGEOLO = UtmSlot(kUtmWest, kUtmNorth) + UtmSlot(east, kUtmNorth) + UtmSlot(east, south) +
+                  UtmSlot(kUtmWest, south);
+    return ImageFile(spec);
+}
+
+std::string RotatedGreyImage()
+{
+    NitfImageSpec spec;
+    spec.rows = kGreyRows;
+    spec.columns = kGreyColumns;
+    spec.ICORDS = 'D';
+    spec.IGEOLO = DegreeSlot(45.0, 10.0) + DegreeSlot(45.1, 10.2) + DegreeSlot(45.05, 10.25) +
+                  DegreeSlot(44.95, 10.05);
+    return ImageFile(spec);
+}
+
+std::string BrokenFrame()
+{
+    NitfFileSpec spec;
+    spec.images.push_back({std::string(100, 'x'), std::string(100, 'y')});
+    spec.userHeaderData = Tre("RPFHDR", std::string(48, '\0'));
+    return BuildNitfFile(spec);
+}
