@@ -36,6 +36,7 @@ void CRpfFrameReader::PrepareDraw(uint32_t width)
     codeCapacity = width / imageSection.kernelWidth + 2;
     codeBuffer.assign(codeCapacity, 0);
     codesHeld = false;
+    imageSection.ReleaseSubframeCache();
 }
 
 void CRpfFrameReader::ReleaseCodeBuffer()
@@ -43,6 +44,7 @@ void CRpfFrameReader::ReleaseCodeBuffer()
     codeBuffer = std::vector<uint16_t>();
     codeCapacity = 0;
     codesHeld = false;
+    imageSection.ReleaseSubframeCache();
 }
 
 bool CRpfFrameReader::FetchCodes(CFileReader& reader, uint32_t imageRow, uint32_t firstColumn, uint32_t lastColumn)

@@ -10,6 +10,8 @@ constexpr uint32_t kNoMaskTable = 0xFFFFFFFF;
 constexpr uint64_t kMaskedSubframeStart = 0xFFFFFFFF;
 constexpr uint8_t kCodeBits = 12; // the only code length of CADRG and CIB frames
 constexpr uint16_t kMaskedCode = 0xFFFF;
+constexpr uint32_t kNoSubframe = 0xFFFFFFFF;
+constexpr uint64_t kMaxSubframeCacheBytes = 1 << 20; // a row of larger subframes is read a code row at a time
 
 } // namespace
 
@@ -122,6 +124,51 @@ bool RpfImageSection::SubframeStart(uint32_t subframe, uint64_t& start) const
     return start < kMaskedSubframeStart;
 }
 
+void RpfImageSection::ReleaseSubframeCache()
+{
+    subframeCache = std::vector<uint8_t>();
+    cachedSubframes = std::vector<uint32_t>();
+}
+
+// The bytes of a code row from the subframe cache, reading the whole subframe
+// into its slot first when the slot holds another. Null when the subframes
+// are too large to cache or this one does not lie whole in the file: the
+// caller then reads the code row alone, with its own checks.
+const uint8_t* RpfImageSection::CachedCodeRow(CFileReader& reader, uint32_t subframe, uint64_t start,
+                                              uint32_t codeRow)
+{
+    const uint64_t cacheBytes = uint64_t(subframesEastWest) * bytesPerSubframe;
+    if (cacheBytes > kMaxSubframeCacheBytes || !FitsInFile(start, bytesPerSubframe, fileSize) ||
+        start > kMaxSeekOffset)
+        return nullptr;
+    if (subframeCache.empty()) {
+        subframeCache.assign(cacheBytes, 0);
+        cachedSubframes.assign(subframesEastWest, kNoSubframe);
+    }
+    const uint32_t slot = subframe % subframesEastWest;
+    uint8_t* held = subframeCache.data() + size_t(slot) * bytesPerSubframe;
+    if (cachedSubframes[slot] != subframe) {
+        cachedSubframes[slot] = kNoSubframe;
+        reader.SeekTo(static_cast<int32_t>(start), kSeekSet);
+        reader.ReadBytes(held, bytesPerSubframe);
+        if (reader.Failed())
+            return nullptr;
+        cachedSubframes[slot] = subframe;
+    }
+    return held + size_t(codeRow) * bytesPerCodeRow;
+}
+
+const uint8_t* RpfImageSection::ReadCodeRowBytes(CFileReader& reader, uint64_t rowStart)
+{
+    // Checked here rather than left to a short read, whose end-of-file flag
+    // would fail every later line of the draw.
+    if (!FitsInFile(rowStart, bytesPerCodeRow, fileSize) || rowStart > kMaxSeekOffset)
+        return nullptr;
+    reader.SeekTo(static_cast<int32_t>(rowStart), kSeekSet);
+    reader.ReadBytes(rawCodeRow.data(), bytesPerCodeRow);
+    return reader.Failed() ? nullptr : rawCodeRow.data();
+}
+
 bool RpfImageSection::ReadSubframeCodes(CFileReader& reader, uint32_t subframe, uint32_t codeRow,
                                         uint32_t firstCode, uint32_t count, uint16_t* output)
 {
@@ -130,16 +177,12 @@ bool RpfImageSection::ReadSubframeCodes(CFileReader& reader, uint32_t subframe, 
         std::fill(output, output + count, kMaskedCode);
         return true;
     }
-    uint64_t rowStart = start + uint64_t(codeRow) * bytesPerCodeRow;
-    // Checked here rather than left to a short read, whose end-of-file flag
-    // would fail every later line of the draw.
-    if (!FitsInFile(rowStart, bytesPerCodeRow, fileSize) || rowStart > kMaxSeekOffset)
+    const uint8_t* packed = CachedCodeRow(reader, subframe, start, codeRow);
+    if (packed == nullptr)
+        packed = ReadCodeRowBytes(reader, start + uint64_t(codeRow) * bytesPerCodeRow);
+    if (packed == nullptr)
         return false;
-    reader.SeekTo(static_cast<int32_t>(rowStart), kSeekSet);
-    reader.ReadBytes(rawCodeRow.data(), bytesPerCodeRow);
-    if (reader.Failed())
-        return false;
-    UnpackCodes(rawCodeRow.data(), bytesPerCodeRow, unpackedCodeRow.data(), imageCodesPerRow, imageCodeBitLength);
+    UnpackCodes(packed, bytesPerCodeRow, unpackedCodeRow.data(), imageCodesPerRow, imageCodeBitLength);
     std::copy(unpackedCodeRow.begin() + firstCode, unpackedCodeRow.begin() + firstCode + count, output);
     return true;
 }

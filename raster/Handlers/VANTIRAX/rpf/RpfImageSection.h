@@ -11,6 +11,10 @@
 struct RpfImageSection {
     std::vector<uint8_t> rawCodeRow;       // one packed code row, allocated by the first ReadCodeRow
     std::vector<uint16_t> unpackedCodeRow; // the same row unpacked
+    // Whole subframes read during one draw, one slot per column of subframes,
+    // so that the code rows of a subframe cost one file read between them.
+    std::vector<uint8_t> subframeCache;
+    std::vector<uint32_t> cachedSubframes; // the subframe each slot holds
 
     // Derived geometry.
     uint16_t kernelWidth = 1;
@@ -53,6 +57,8 @@ struct RpfImageSection {
     // column group from firstColumn's group to lastColumn's (both inclusive).
     bool ReadCodeRow(CFileReader& reader, uint32_t imageRow, uint32_t firstColumn, uint32_t lastColumn,
                      uint32_t capacity, uint16_t* output);
+    // Empties the subframe cache; every draw starts with an empty one.
+    void ReleaseSubframeCache();
 
 private:
     bool ReadDescription(CFileReader& reader, uint32_t location, bool bigEndian);
@@ -62,6 +68,8 @@ private:
     bool ReadMaskTable(CFileReader& reader, uint32_t maskLocation, uint32_t offset, bool bigEndian,
                        std::vector<uint32_t>& table);
     bool SubframeStart(uint32_t subframe, uint64_t& start) const;
+    const uint8_t* CachedCodeRow(CFileReader& reader, uint32_t subframe, uint64_t start, uint32_t codeRow);
+    const uint8_t* ReadCodeRowBytes(CFileReader& reader, uint64_t rowStart);
     bool ReadSubframeCodes(CFileReader& reader, uint32_t subframe, uint32_t codeRow, uint32_t firstCode,
                            uint32_t count, uint16_t* output);
 };
