@@ -1,0 +1,141 @@
+// rhlhost render --jobs N -o OUTDIR: directories walked, every recognised file
+// rendered on worker threads, everything else reported and passed over; no
+// partial output ever carries a final name.
+#include "HostProcess.h"
+#include "HostSamples.h"
+#include "tests/fixtures/NitfFileWriter.h"
+#include "tests/fixtures/TempFiles.h"
+
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <filesystem>
+#include <thread>
+
+namespace {
+
+namespace fs = std::filesystem;
+
+constexpr int kJunkFiles = 300;
+constexpr int kBulkFrames = 1000;
+constexpr int kFewFrames = 100;
+// Growth of the host's peak memory from 100 to 1,000 frames that still
+// counts as flat: far less than one frame's decoding tables per file.
+constexpr long kFlatMemoryKilobytes = 8 * 1024;
+
+std::vector<std::string> FilesBelow(const std::string& directory)
+{
+    std::vector<std::string> files;
+    for (const auto& entry : fs::recursive_directory_iterator(directory))
+        if (entry.is_regular_file())
+            files.push_back(fs::relative(entry.path(), directory).string());
+    std::sort(files.begin(), files.end());
+    return files;
+}
+
+bool NoTemporaryFiles(const std::string& directory)
+{
+    for (const std::string& file : FilesBelow(directory))
+        if (file.find(".part-") != std::string::npos)
+            return false;
+    return true;
+}
+
+void WriteFrames(const std::string& directory, int count, const std::string& bytes)
+{
+    fs::create_directories(directory);
+    for (int i = 0; i < count; ++i)
+        WriteFile(directory + "/frame" + std::to_string(i) + ".ntf", bytes);
+}
+
+TEST(HostBatch, DirectoryOfMostlyOtherFilesRendersTheRecognisedOnes)
+{
+    TempDirectory in, out;
+    for (int i = 0; i < kJunkFiles; ++i)
+        WriteFile(in / ("junk" + std::to_string(i) + ".txt"), std::string(size_t(i), char('a' + i % 26)));
+    fs::create_directories(in / "deeper/still");
+    WriteFile(in / "deeper/still/frame.ntf", SmallFrameFile());
+    WriteFile(in / "utm.ntf", UtmRgbImage());
+    WriteFile(in / "broken.ntf", BrokenFrame());
+
+    ProcessResult result = RunHost({"render", "--jobs", "2", "-o", out.path(), in.path()});
+    EXPECT_EQ(result.exitCode, 1) << "one recognised file could not be opened";
+    EXPECT_NE(result.err.find("broken.ntf: the handler could not open it"), std::string::npos) << result.err;
+    EXPECT_NE(result.err.find("303 files: 2 rendered (0 with 0 undecodable rows), 301 refused (300 not "
+                              "recognised, 1 not opened, 0 vanished), 0 failed to write"),
+              std::string::npos)
+        << result.err;
+    EXPECT_EQ(FilesBelow(out.path()), (std::vector<std::string>{"deeper/still/frame.ntf.tif", "utm.ntf.tif"}));
+}
+
+TEST(HostBatch, NamedFilesThatAreGoneAreReportedAndTheRestRendered)
+{
+    TempDirectory in, out;
+    WriteFile(in / "a.ntf", UtmRgbImage());
+    ProcessResult result =
+        RunHost({"render", "--format", "png", "-o", out.path(), in / "gone.ntf", in / "a.ntf"});
+    EXPECT_EQ(result.exitCode, 1);
+    EXPECT_NE(result.err.find("gone.ntf: the file no longer exists"), std::string::npos) << result.err;
+    EXPECT_EQ(FilesBelow(out.path()), std::vector<std::string>{"a.ntf.png"});
+}
+
+TEST(HostBatch, FilesVanishingDuringTheBatchNeverStopIt)
+{
+    TempDirectory in, out;
+    WriteFrames(in.path(), kFewFrames * 2, SmallFrameFile());
+    ProcessResult result;
+    std::atomic<bool> batchDone{false};
+    std::thread batch([&] {
+        result = RunHost({"render", "--jobs", "2", "--window", "0,0,64,64", "-o", out.path(), in.path()});
+        batchDone = true;
+    });
+    // The walk is over once the first output appears; then every other file goes.
+    while (FilesBelow(out.path()).empty() && !batchDone)
+        std::this_thread::yield();
+    for (int i = kFewFrames * 2 - 1; i >= 0; i -= 2)
+        fs::remove(in / ("frame" + std::to_string(i) + ".ntf"));
+    batch.join();
+    EXPECT_TRUE(result.exitCode == 0 || result.exitCode == 1) << result.err;
+    EXPECT_NE(result.err.find("200 files: "), std::string::npos) << result.err;
+    const size_t rendered = FilesBelow(out.path()).size();
+    EXPECT_GE(rendered, size_t(kFewFrames));
+    const std::string vanished = std::to_string(kFewFrames * 2 - rendered) + " vanished";
+    EXPECT_NE(result.err.find(std::to_string(rendered) + " rendered"), std::string::npos) << result.err;
+    EXPECT_NE(result.err.find(vanished), std::string::npos) << result.err;
+    EXPECT_TRUE(NoTemporaryFiles(out.path()));
+}
+
+TEST(HostBatch, UnwritableOutputDirectoryIsReportedOnce)
+{
+    TempDirectory in;
+    WriteFile(in / "a.ntf", UtmRgbImage());
+    ProcessResult result = RunHost({"render", "-o", in / "a.ntf/out", in.path()});
+    EXPECT_EQ(result.exitCode, 1);
+    EXPECT_NE(result.err.find("cannot create " + (in / "a.ntf/out")), std::string::npos) << result.err;
+    EXPECT_EQ(FilesBelow(in.path()), std::vector<std::string>{"a.ntf"});
+}
+
+// Each frame opens its own handle and releases it: the host's peak memory
+// over 1,000 frames stays where it is over 100.
+TEST(HostBatch, ThousandFramesOnTwoWorkersKeepMemoryFlat)
+{
+    TempDirectory in, out;
+    const std::string frame = SmallFrameFile();
+    WriteFrames(in / "few", kFewFrames, frame);
+    WriteFrames(in / "many", kBulkFrames, frame);
+    const std::vector<std::string> options = {"render", "--jobs", "2", "--window", "0,0,64,64", "-o"};
+    std::vector<std::string> few = options, many = options;
+    few.insert(few.end(), {out / "few", in / "few"});
+    many.insert(many.end(), {out / "many", in / "many"});
+    ProcessResult small = RunHost(few);
+    ProcessResult large = RunHost(many);
+    ASSERT_EQ(small.exitCode, 0) << small.err;
+    ASSERT_EQ(large.exitCode, 0) << large.err;
+    EXPECT_EQ(FilesBelow(out / "many").size(), size_t(kBulkFrames));
+    RecordProperty("peak_kilobytes_100", std::to_string(small.peakKilobytes));
+    RecordProperty("peak_kilobytes_1000", std::to_string(large.peakKilobytes));
+    EXPECT_LT(large.peakKilobytes - small.peakKilobytes, kFlatMemoryKilobytes)
+        << "100 frames: " << small.peakKilobytes << " kB, 1000 frames: " << large.peakKilobytes << " kB";
+}
+
+} // namespace
