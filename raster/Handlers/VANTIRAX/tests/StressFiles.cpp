@@ -1,0 +1,121 @@
+#include "tests/StressFiles.h"
+
+#include "tests/fixtures/BiLevelWriter.h"
+#include "tests/fixtures/JpegBlockWriter.h"
+#include "tests/fixtures/NitfImageWriter.h"
+#include "tests/fixtures/RpfFrameWriter.h"
+
+namespace {
+
+constexpr uint32_t kJpegBlockSide = 16;
+constexpr uint32_t kBiLevelWidth = 96, kBiLevelHeight = 48;
+constexpr uint64_t kFnvOffset = 1469598103934665603ull, kFnvPrime = 1099511628211ull;
+
+std::string AsString(const std::vector<uint8_t>& bytes)
+{
+    return std::string(bytes.begin(), bytes.end());
+}
+
+NitfImageSpec BlockedImage(const std::string& IREP, int32_t bands, int32_t side, int32_t blockSide)
+{
+    NitfImageSpec spec;
+    spec.rows = spec.columns = side;
+    spec.NPPBH = spec.NPPBV = blockSide;
+    spec.NBPR = spec.NBPC = (side + blockSide - 1) / blockSide;
+    spec.IREP = IREP;
+    spec.bands.assign(size_t(bands), NitfBandSpec{});
+    return spec;
+}
+
+std::string JpegFile(unsigned seed)
+{
+    std::vector<Bytes> blocks;
+    for (unsigned block = 0; block < 4; ++block)
+        blocks.push_back(EncodeJpegBlock(TestPattern(kJpegBlockSide, kJpegBlockSide, 1, seed * 4 + block), {}));
+    NitfImageSpec spec = BlockedImage("MONO", 1, 2 * kJpegBlockSide, kJpegBlockSide);
+    spec.IC = "C3";
+    spec.COMRAT = "00.0";
+    return BuildImageFile(spec, AsString(BuildNitfJpegData(blocks, NitfApp6Spec{2, 2, 0, 0})));
+}
+
+std::string BiLevelFile(unsigned seed)
+{
+    std::vector<uint8_t> packed(size_t(kBiLevelWidth / 8) * kBiLevelHeight);
+    for (size_t i = 0; i < packed.size(); ++i)
+        packed[i] = static_cast<uint8_t>((i * 37 + seed * 11) ^ (i / 12));
+    NitfImageSpec spec; // one block of the image's size, MONO
+    spec.columns = int32_t(kBiLevelWidth);
+    spec.rows = int32_t(kBiLevelHeight);
+    spec.NBPP = 1;
+    spec.IC = "C1";
+    spec.COMRAT = seed % 2 ? "2DS " : "1D  ";
+    return BuildImageFile(spec, AsString(EncodeT4Strip(packed, kBiLevelWidth, kBiLevelHeight, seed % 2 == 1)));
+}
+
+std::string RpfFile(unsigned seed)
+{
+    RpfFrameSpec spec;
+    spec.product = seed % 2 ? RpfProduct::Cib : RpfProduct::Cadrg;
+    spec.bigEndian = seed % 3 != 0;
+    spec.indexImage = PatternIndexImage();
+    spec.maskedSubframes = {seed % kRpfSubframeCount};
+    return BuildRpfFrame(spec).bytes;
+}
+
+std::string UncompressedFile(unsigned seed)
+{
+    NitfImageSpec spec = BlockedImage("RGB", 3, 40, 16);
+    spec.IMODE = "BPRS"[seed % 4];
+    spec.bands[0].IREPBAND = "R";
+    spec.bands[1].IREPBAND = "G";
+    spec.bands[2].IREPBAND = "B";
+    const PixelValue pixel = [seed](int32_t band, int32_t row, int32_t column) {
+        return uint64_t(band * 71 + row * 13 + column * 7 + seed * 5) & 0xFF;
+    };
+    return BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, pixel)));
+}
+
+void Mix(uint64_t& digest, const uint8_t* bytes, size_t count)
+{
+    for (size_t i = 0; i < count; ++i)
+        digest = (digest ^ bytes[i]) * kFnvPrime;
+}
+
+} // namespace
+
+std::vector<StressFile> FilesOfEveryKind(unsigned seed)
+{
+    return {{"jpeg", JpegFile(seed)},
+            {"bilevel", BiLevelFile(seed)},
+            {"rpf", RpfFile(seed)},
+            {"uncompressed", UncompressedFile(seed)}};
+}
+
+bool DrawResult::operator==(const DrawResult& other) const
+{
+    return openResult == other.openResult && status == other.status && width == other.width &&
+           height == other.height && pixelKind == other.pixelKind && failedRows == other.failedRows &&
+           digest == other.digest;
+}
+
+DrawResult OpenDrawClose(const HandlerExports& rh, const std::string& path, uint32_t maxRows)
+{
+    DrawResult result;
+    OpenedImage image(rh, path);
+    result.openResult = image.result;
+    result.status = image.handle.status;
+    if (!image.Ready())
+        return result;
+    result.width = image.handle.width;
+    result.height = image.handle.height;
+    result.pixelKind = image.handle.pixelKind;
+    result.digest = kFnvOffset;
+    if (image.handle.palette != nullptr)
+        Mix(result.digest, image.handle.palette->entries, size_t(image.handle.palette->entryCount) * 3);
+    const uint32_t rows = result.height < maxRows ? result.height : maxRows;
+    std::vector<uint8_t> pixels;
+    if (!image.Draw(0, 0, int32_t(result.width), int32_t(rows), pixels, result.failedRows))
+        result.failedRows = UINT32_MAX;
+    Mix(result.digest, pixels.data(), pixels.size());
+    return result;
+}
