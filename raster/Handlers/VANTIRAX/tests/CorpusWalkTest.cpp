@@ -5,6 +5,7 @@
 
 #include <gtest/gtest.h>
 
+#include <cstdio>
 #include <filesystem>
 #include <fstream>
 #include <map>
@@ -65,11 +66,19 @@ uint32_t GdalChecksum(const std::vector<uint8_t>& pixels, uint32_t width, uint32
     return sum;
 }
 
-// Files whose band 1 is not the byte we deliver: wider samples are scaled
-// into a grey palette, so GDAL's 16-bit values cannot be compared.
-bool ComparableWithGdal(const CatalogueEntry& entry)
+// Differences from GDAL by design, by file.
+const std::map<std::string, std::string> kIntendedDifferences = {
+    // The JPEG stream carries no DQT: the default quantisation tables are
+    // inserted in the coefficient order NITF lists them, which GDAL reads in
+    // another order.
+    {"jitc-nitf20/U_1125C.NTF", "default quantisation table order"},
+};
+
+// Files whose band 1 is the byte we deliver. Wider samples are scaled into a
+// grey palette, so GDAL's 16-bit values cannot be compared.
+bool ComparableWithGdal(const std::string& name, const CatalogueEntry& entry)
 {
-    return entry.hasChecksum && entry.bitsPerPixel.rfind("8/8", 0) == 0;
+    return entry.hasChecksum && entry.bitsPerPixel.rfind("8/8", 0) == 0 && kIntendedDifferences.count(name) == 0;
 }
 
 TEST(CorpusWalk, EveryFileOpensAndDrawsOrIsRefusedCleanly)
@@ -81,6 +90,7 @@ TEST(CorpusWalk, EveryFileOpensAndDrawsOrIsRefusedCleanly)
     const HandlerExports& rh = LoadHandler(VX_HANDLER_PATH);
 
     size_t served = 0;
+    size_t compared = 0;
     for (const auto& [name, entry] : catalogue) {
         const std::string path = (corpus / name).string();
         SCOPED_TRACE(name);
@@ -94,12 +104,15 @@ TEST(CorpusWalk, EveryFileOpensAndDrawsOrIsRefusedCleanly)
         ++served;
         if (!probed)
             ADD_FAILURE() << "opens but the probe says no";
-        if (ComparableWithGdal(entry) && failedRows == 0) {
+        if (ComparableWithGdal(name, entry) && failedRows == 0) {
             uint32_t ours = GdalChecksum(pixels, image.handle.width, image.handle.height, image.BytesPerPixel());
             EXPECT_EQ(ours, entry.checksum) << "pixel kind " << image.handle.pixelKind;
+            ++compared;
         }
     }
-    EXPECT_GT(served, 0u);
+    std::printf("%zu files served, %zu compared with GDAL\n", served, compared);
+    EXPECT_GE(served, 30u);
+    EXPECT_GE(compared, 20u);
 }
 
 } // namespace
