@@ -96,3 +96,15 @@ bool RpfCompressionSection::DecodeKernelRow(uint16_t kernelRow, uint16_t code, u
     }
     return table.ReadTableEntry(code, output);
 }
+
+const RpfValueTable* RpfCompressionSection::ByteTable(uint16_t kernelRow, uint16_t kernelWidth) const
+{
+    if (kernelRow >= lookupTables.size())
+        return nullptr;
+    const RpfValueTable& table = lookupTables[kernelRow];
+    const bool exact = table.valueBitLength == 8 && table.valuesPerRecord == kernelWidth &&
+                       table.recordSize == kernelWidth && table.totalSize != 0 &&
+                       table.data.size() == table.totalSize &&
+                       uint64_t(table.recordCount) * table.recordSize <= table.totalSize;
+    return exact ? &table : nullptr;
+}

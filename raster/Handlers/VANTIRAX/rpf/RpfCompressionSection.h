@@ -30,6 +30,10 @@ struct RpfCompressionSection {
                                 uint32_t parameterLocation, bool bigEndian);
     // Writes the kernelWidth pixel values of one kernel row of one code.
     bool DecodeKernelRow(uint16_t kernelRow, uint16_t code, uint16_t kernelWidth, uint8_t* output) const;
+    // The table of a kernel row when its records are exactly kernelWidth
+    // 8-bit values, so that a code's pixels can be taken straight from it
+    // (DecodeKernelRow gives the same pixels); null otherwise.
+    const RpfValueTable* ByteTable(uint16_t kernelRow, uint16_t kernelWidth) const;
 
 private:
     bool ReadLookupSubsection(CFileReader& reader, bool bigEndian);

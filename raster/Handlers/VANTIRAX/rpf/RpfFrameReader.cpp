@@ -1,6 +1,11 @@
 #include "rpf/RpfFrameReader.h"
 
+#include <algorithm>
 #include <cstring>
+
+namespace {
+constexpr uint32_t kCommonKernelWidth = 4; // CADRG and CIB kernels are 4 x 4
+}
 
 bool CRpfFrameReader::Open(CFileReader& reader, uint32_t headerSectionOffset)
 {
@@ -81,6 +86,8 @@ bool CRpfFrameReader::AssembleLine(uint32_t imageRow, uint32_t firstColumn, uint
         return false;
     if (kernelRowBuffer.empty())
         kernelRowBuffer.assign(kernelWidth, 0);
+    if (const RpfValueTable* table = compressionSection.ByteTable(kernelRow, kernelWidth))
+        return AssembleFromTable(*table, firstOffset, span, output);
     uint8_t* kernel = kernelRowBuffer.data();
     uint32_t written = 0;
     for (uint32_t codeIndex = 0; written < span; ++codeIndex) {
@@ -91,6 +98,31 @@ bool CRpfFrameReader::AssembleLine(uint32_t imageRow, uint32_t firstColumn, uint
         if (count > span - written)
             count = span - written;
         std::memcpy(output + written, kernel + from, count);
+        written += count;
+    }
+    return true;
+}
+
+// AssembleLine for a table whose records are whole kernel rows of bytes: each
+// code's pixels are copied straight from its record.
+bool CRpfFrameReader::AssembleFromTable(const RpfValueTable& table, uint32_t firstOffset, uint32_t span,
+                                        uint8_t* output)
+{
+    const uint16_t kernelWidth = imageSection.kernelWidth;
+    uint8_t* masked = kernelRowBuffer.data();
+    std::memset(masked, MaskedPixel, kernelWidth);
+    uint32_t written = 0;
+    for (uint32_t codeIndex = 0; written < span; ++codeIndex) {
+        const uint16_t code = codeBuffer[codeIndex];
+        if (code != MaskedCode && code >= table.recordCount)
+            return false;
+        const uint8_t* kernel = code == MaskedCode ? masked : table.data.data() + size_t(code) * kernelWidth;
+        const uint32_t from = codeIndex == 0 ? firstOffset : 0;
+        const uint32_t count = std::min<uint32_t>(kernelWidth - from, span - written);
+        if (count == kCommonKernelWidth)
+            std::memcpy(output + written, kernel + from, kCommonKernelWidth); // fixed size: one move
+        else
+            std::memcpy(output + written, kernel + from, count);
         written += count;
     }
     return true;

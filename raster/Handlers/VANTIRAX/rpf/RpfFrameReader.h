@@ -52,4 +52,5 @@ private:
 
     bool FetchCodes(CFileReader& reader, uint32_t imageRow, uint32_t firstColumn, uint32_t lastColumn);
     bool AssembleLine(uint32_t imageRow, uint32_t firstColumn, uint32_t lastColumn, uint8_t* output);
+    bool AssembleFromTable(const RpfValueTable& table, uint32_t firstOffset, uint32_t span, uint8_t* output);
 };
