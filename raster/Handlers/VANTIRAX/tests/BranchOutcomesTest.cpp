@@ -1,0 +1,234 @@
+// What the host reads after RH_Open for each kind of file, and the rows it is
+// then given: RPF frames and plain NITF images written by the fixture writers.
+#include "tests/fixtures/HandlerLoader.h"
+#include "tests/fixtures/NitfImageWriter.h"
+#include "tests/fixtures/RpfFrameWriter.h"
+#include "tests/fixtures/TempFiles.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+
+namespace {
+
+const HandlerExports& Handler()
+{
+    return LoadHandler(VX_HANDLER_PATH);
+}
+
+std::vector<uint8_t> PaletteOf(const RHHandle& handle)
+{
+    if (handle.palette == nullptr || handle.palette->entryCount <= 0)
+        return {};
+    return std::vector<uint8_t>(handle.palette->entries, handle.palette->entries + handle.palette->entryCount * 3);
+}
+
+TEST(RpfFrameOutcomes, CadrgFrameWithMaskedSubframes)
+{
+    RpfFrameSpec layout;
+    layout.indexImage = PatternIndexImage();
+    layout.maskedSubframes = {0, 7, 35};
+    RpfFrame frame = BuildRpfFrame(layout);
+    TempFile file(frame.bytes, ".ntf");
+
+    OpenedImage image(Handler(), file.path());
+    ASSERT_TRUE(image.Ready());
+    EXPECT_EQ(image.handle.width, 1536u);
+    EXPECT_EQ(image.handle.height, 1536u);
+    EXPECT_EQ(image.handle.pixelKind, kPixelPaletted);
+    std::vector<uint8_t> palette = PaletteOf(image.handle);
+    ASSERT_EQ(palette.size(), 217u * 3);
+    for (size_t i = 0; i < 216; ++i)
+        ASSERT_EQ(std::vector<uint8_t>(palette.begin() + i * 3, palette.begin() + i * 3 + 3),
+                  std::vector<uint8_t>(frame.palette[i].begin(), frame.palette[i].end()))
+            << i;
+    EXPECT_EQ(std::vector<uint8_t>(palette.end() - 3, palette.end()), std::vector<uint8_t>(3, 255));
+
+    const RHGeoRef* geoRef = image.handle.geoRef;
+    ASSERT_NE(geoRef, nullptr);
+    EXPECT_EQ(geoRef->epsgCode, 4326u);
+    EXPECT_EQ(geoRef->controlPointCount, 3u);
+    const double expected[3][4] = {{0, 0, -100, 40}, {1535, 0, -99.5, 40}, {0, 1535, -100, 39.5}};
+    for (int i = 0; i < 3; ++i) {
+        EXPECT_DOUBLE_EQ(geoRef->points[i].column, expected[i][0]);
+        EXPECT_DOUBLE_EQ(geoRef->points[i].row, expected[i][1]);
+        EXPECT_DOUBLE_EQ(geoRef->points[i].worldX, expected[i][2]);
+        EXPECT_DOUBLE_EQ(geoRef->points[i].worldY, expected[i][3]);
+    }
+
+    std::vector<uint8_t> pixels;
+    uint32_t failedRows = 0;
+    ASSERT_TRUE(image.DrawAll(pixels, failedRows));
+    EXPECT_EQ(failedRows, 0u);
+    EXPECT_TRUE(pixels == ExpectedRpfPixels(layout));
+
+    // A window inside the frame: the same pixels, any column span.
+    ASSERT_TRUE(image.Draw(100, 1000, 777, 1004, pixels, failedRows));
+    std::vector<uint8_t> whole = ExpectedRpfPixels(layout);
+    for (int row = 0; row < 4; ++row)
+        ASSERT_TRUE(std::equal(pixels.begin() + row * 677, pixels.begin() + (row + 1) * 677,
+                               whole.begin() + (1000 + row) * 1536 + 100))
+            << row;
+}
+
+TEST(RpfFrameOutcomes, LittleEndianCibFrameHasAGreyPalette)
+{
+    RpfFrameSpec layout;
+    layout.product = RpfProduct::Cib;
+    layout.bigEndian = false;
+    layout.indexImage = PatternIndexImage();
+    TempFile file(BuildRpfFrame(layout).bytes, ".ntf");
+    OpenedImage image(Handler(), file.path());
+    ASSERT_TRUE(image.Ready());
+    EXPECT_EQ(image.handle.pixelKind, kPixelPaletted);
+    std::vector<uint8_t> palette = PaletteOf(image.handle);
+    ASSERT_EQ(palette.size(), 217u * 3);
+    for (size_t i = 0; i < 217; ++i)
+        ASSERT_TRUE(palette[i * 3] == palette[i * 3 + 1] && palette[i * 3] == palette[i * 3 + 2]) << i;
+    std::vector<uint8_t> pixels;
+    uint32_t failedRows = 0;
+    ASSERT_TRUE(image.DrawAll(pixels, failedRows));
+    EXPECT_TRUE(pixels == ExpectedRpfPixels(layout));
+}
+
+TEST(RpfFrameOutcomes, ShortColourTableFailsThePaletteBuild)
+{
+    RpfFrameSpec layout;
+    layout.indexImage = std::vector<uint8_t>(kRpfFrameSide * kRpfFrameSide, 3);
+    layout.colorTableRecords = {32};
+    TempFile file(BuildRpfFrame(layout).bytes, ".ntf");
+    OpenedImage image(Handler(), file.path());
+    EXPECT_EQ(image.result, 0);
+    EXPECT_EQ(image.handle.status, kStatusFailed);
+    EXPECT_NE(image.handle.handler, nullptr);
+}
+
+TEST(RpfFrameOutcomes, StandInHostDumpsTheIndexImage)
+{
+    RpfFrameSpec layout;
+    layout.indexImage = PatternIndexImage();
+    layout.maskedSubframes = {14};
+    TempFile file(BuildRpfFrame(layout).bytes, ".ntf");
+    TempFile dump(".raw");
+    std::string command = std::string(VX_HOST_PATH) + " --handler " + VX_HANDLER_PATH + " dump " + file.path() +
+                          " " + dump.path();
+    ASSERT_EQ(std::system(command.c_str()), 0);
+    std::string bytes = ReadWholeFile(dump.path());
+    EXPECT_TRUE(std::vector<uint8_t>(bytes.begin(), bytes.end()) == ExpectedRpfPixels(layout));
+}
+
+// A plain NITF file holding one image of the given layout with a ramp of values.
+std::string PlainImage(const NitfImageSpec& layout)
+{
+    PixelValue ramp = [](int32_t band, int32_t row, int32_t column) {
+        return uint64_t(band * 50 + row * 3 + column) & 0xFF;
+    };
+    return BuildImageFile(layout, JoinBlocks(BuildImageBlocks(layout, ramp)));
+}
+
+NitfImageSpec Rgb(int32_t rows, int32_t columns)
+{
+    NitfImageSpec layout;
+    layout.rows = rows;
+    layout.columns = columns;
+    layout.IREP = "RGB";
+    layout.bands = {NitfBandSpec{"R", 0, 0, ""}, NitfBandSpec{"G", 0, 0, ""}, NitfBandSpec{"B", 0, 0, ""}};
+    return layout;
+}
+
+TEST(PlainNitfOutcomes, ThreeBandRgbIsDirectWithoutPalette)
+{
+    NitfImageSpec layout = Rgb(6, 9);
+    layout.IMODE = 'P';
+    TempFile file(PlainImage(layout), ".ntf");
+    OpenedImage image(Handler(), file.path());
+    ASSERT_TRUE(image.Ready());
+    EXPECT_EQ(image.handle.pixelKind, kPixelDirect);
+    EXPECT_EQ(image.handle.palette, nullptr);
+    EXPECT_EQ(image.handle.geoRef, nullptr); // ICORDS blank
+    std::vector<uint8_t> pixels;
+    uint32_t failedRows = 0;
+    ASSERT_TRUE(image.DrawAll(pixels, failedRows));
+    ASSERT_EQ(pixels.size(), 6u * 9 * 3);
+    EXPECT_EQ(pixels[(2 * 9 + 4) * 3 + 1], 50 + 2 * 3 + 4); // green of row 2, column 4
+}
+
+TEST(PlainNitfOutcomes, LookupTableSizesThePalette)
+{
+    NitfImageSpec layout;
+    layout.rows = layout.columns = 8;
+    layout.IREP = "RGB/LUT";
+    layout.bands = {NitfBandSpec{"LU", 3, 200, RgbLookupTables(200)}};
+    TempFile file(PlainImage(layout), ".ntf");
+    OpenedImage image(Handler(), file.path());
+    ASSERT_TRUE(image.Ready());
+    EXPECT_EQ(image.handle.pixelKind, kPixelPaletted);
+    std::vector<uint8_t> palette = PaletteOf(image.handle);
+    ASSERT_EQ(palette.size(), 200u * 3);
+    EXPECT_EQ(palette[199 * 3 + 1], 255 - 199);
+}
+
+TEST(PlainNitfOutcomes, SixteenBitMonoIsGreyPaletted)
+{
+    NitfImageSpec layout;
+    layout.rows = layout.columns = 4;
+    layout.NBPP = 16;
+    layout.ABPP = 11;
+    TempFile file(PlainImage(layout), ".ntf");
+    OpenedImage image(Handler(), file.path());
+    ASSERT_TRUE(image.Ready());
+    EXPECT_EQ(image.handle.pixelKind, kPixelGreyPaletted);
+    std::vector<uint8_t> palette = PaletteOf(image.handle);
+    ASSERT_EQ(palette.size(), 256u * 3);
+    EXPECT_EQ(palette[77 * 3], 77);
+    EXPECT_EQ(palette[77 * 3 + 2], 77);
+}
+
+TEST(PlainNitfOutcomes, CornersGiveTheEpsgCode)
+{
+    NitfImageSpec geographic = Rgb(10, 20);
+    geographic.ICORDS = 'G';
+    geographic.IGEOLO = "400000N1000000W400000N0993000W393000N0993000W393000N1000000W";
+    TempFile geographicFile(PlainImage(geographic), ".ntf");
+    OpenedImage degrees(Handler(), geographicFile.path());
+    ASSERT_TRUE(degrees.Ready());
+    ASSERT_NE(degrees.handle.geoRef, nullptr);
+    EXPECT_EQ(degrees.handle.geoRef->epsgCode, 4326u);
+    EXPECT_DOUBLE_EQ(degrees.handle.geoRef->points[1].worldX, -99.5);
+    EXPECT_DOUBLE_EQ(degrees.handle.geoRef->points[1].column, 19);
+    EXPECT_DOUBLE_EQ(degrees.handle.geoRef->points[2].worldY, 39.5);
+    EXPECT_DOUBLE_EQ(degrees.handle.geoRef->points[2].row, 9);
+
+    NitfImageSpec utm = Rgb(10, 20);
+    utm.ICORDS = 'N';
+    utm.IGEOLO = "335000004400000335010004400000335010004399000335000004399000";
+    TempFile utmFile(PlainImage(utm), ".ntf");
+    OpenedImage metres(Handler(), utmFile.path());
+    ASSERT_TRUE(metres.Ready());
+    ASSERT_NE(metres.handle.geoRef, nullptr);
+    EXPECT_EQ(metres.handle.geoRef->epsgCode, 32633u);
+    EXPECT_DOUBLE_EQ(metres.handle.geoRef->points[0].worldX, 500000);
+    EXPECT_DOUBLE_EQ(metres.handle.geoRef->points[2].worldY, 4399000);
+}
+
+TEST(PlainNitfOutcomes, UnservedCompressionCodes)
+{
+    NitfImageSpec layout;
+    layout.rows = layout.columns = 8;
+    layout.COMRAT = "00.0";
+    layout.IC = "C2"; // parses, but is never served: result 1, status 5
+    TempFile c2(BuildImageFile(layout, std::string(64, '\0')), ".ntf");
+    OpenedImage dpcm(Handler(), c2.path());
+    EXPECT_EQ(dpcm.result, 1);
+    EXPECT_EQ(dpcm.handle.status, kStatusFailed);
+    EXPECT_EQ(Handler().isFormat(c2.c_str()), 0);
+
+    layout.IC = "C8"; // not even parsed: result 0, status 5
+    TempFile c8(BuildImageFile(layout, std::string(64, '\0')), ".ntf");
+    OpenedImage jpeg2000(Handler(), c8.path());
+    EXPECT_EQ(jpeg2000.result, 0);
+    EXPECT_EQ(jpeg2000.handle.status, kStatusFailed);
+    EXPECT_NE(jpeg2000.handle.handler, nullptr);
+}
+
+} // namespace
