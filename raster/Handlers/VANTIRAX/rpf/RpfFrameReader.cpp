@@ -104,26 +104,40 @@ bool CRpfFrameReader::AssembleLine(uint32_t imageRow, uint32_t firstColumn, uint
 }
 
 // AssembleLine for a table whose records are whole kernel rows of bytes: each
-// code's pixels are copied straight from its record.
+// code's pixels are copied straight from its record. The span's first and
+// last codes may be cut; every code between gives a whole kernel row.
 bool CRpfFrameReader::AssembleFromTable(const RpfValueTable& table, uint32_t firstOffset, uint32_t span,
                                         uint8_t* output)
 {
     const uint16_t kernelWidth = imageSection.kernelWidth;
     uint8_t* masked = kernelRowBuffer.data();
     std::memset(masked, MaskedPixel, kernelWidth);
-    uint32_t written = 0;
-    for (uint32_t codeIndex = 0; written < span; ++codeIndex) {
-        const uint16_t code = codeBuffer[codeIndex];
-        if (code != MaskedCode && code >= table.recordCount)
+    const uint16_t* code = codeBuffer.data();
+    // Copied into the lambda: writes to output may not reload them.
+    const uint8_t* records = table.data.data();
+    const uint32_t recordCount = table.recordCount;
+    auto kernelOf = [masked, records, recordCount, kernelWidth](uint16_t value) -> const uint8_t* {
+        if (value == MaskedCode)
+            return masked;
+        return value < recordCount ? records + size_t(value) * kernelWidth : nullptr;
+    };
+    const uint8_t* kernel = kernelOf(*code++);
+    if (kernel == nullptr)
+        return false;
+    uint32_t written = std::min<uint32_t>(kernelWidth - firstOffset, span);
+    std::memcpy(output, kernel + firstOffset, written);
+    for (; span - written >= kernelWidth; written += kernelWidth) {
+        if ((kernel = kernelOf(*code++)) == nullptr)
             return false;
-        const uint8_t* kernel = code == MaskedCode ? masked : table.data.data() + size_t(code) * kernelWidth;
-        const uint32_t from = codeIndex == 0 ? firstOffset : 0;
-        const uint32_t count = std::min<uint32_t>(kernelWidth - from, span - written);
-        if (count == kCommonKernelWidth)
-            std::memcpy(output + written, kernel + from, kCommonKernelWidth); // fixed size: one move
+        if (kernelWidth == kCommonKernelWidth)
+            std::memcpy(output + written, kernel, kCommonKernelWidth); // fixed size: one move
         else
-            std::memcpy(output + written, kernel + from, count);
-        written += count;
+            std::memcpy(output + written, kernel, kernelWidth);
     }
+    if (written == span)
+        return true;
+    if ((kernel = kernelOf(*code)) == nullptr)
+        return false;
+    std::memcpy(output + written, kernel, span - written);
     return true;
 }
