@@ -19,11 +19,13 @@ constexpr uint32_t kRowsPerStrip = 64;
 constexpr unsigned kColourMapSize = 256;
 constexpr uint16_t kEightBitTo16 = 257;
 
-// libtiff reports through process-wide handlers; the writer makes its own messages.
-void SilenceLibtiff()
+// Process-wide libtiff state, set once before any worker thread opens a file:
+// the GeoTIFF tags, and no messages of its own (the writer makes its own).
+void PrepareLibtiff()
 {
     static std::once_flag once;
     std::call_once(once, [] {
+        XTIFFInitialize();
         TIFFSetErrorHandler(nullptr);
         TIFFSetWarningHandler(nullptr);
     });
@@ -129,7 +131,7 @@ bool WriteGeoTiff(const std::string& path, const Raster& raster, const GeoRefere
         message = "the window is empty";
         return false;
     }
-    SilenceLibtiff();
+    PrepareLibtiff();
     TIFF* tiff = XTIFFOpen(path.c_str(), "w");
     if (tiff == nullptr) {
         message = std::strerror(errno);

@@ -13,7 +13,6 @@
 namespace host {
 namespace {
 
-constexpr uint32_t kMosaicEpsg = 4326;
 constexpr size_t kMaxPaletteEntries = 256;
 constexpr uint8_t kOpaque = 255;
 

@@ -9,7 +9,6 @@
 namespace host {
 namespace {
 
-constexpr uint32_t kMosaicEpsg = 4326;
 // Frames of one product share their pixel size to far better than this.
 constexpr double kScaleTolerance = 1e-6;
 constexpr double kMaxMosaicPixels = double(1u << 28);

@@ -10,6 +10,9 @@
 
 namespace host {
 
+// Every frame of a mosaic is in WGS 84 longitude and latitude.
+constexpr uint32_t kMosaicEpsg = 4326;
+
 struct MosaicFrame {
     std::string path;
     uint32_t width = 0, height = 0;

@@ -105,6 +105,22 @@ TEST(HostBatch, FilesVanishingDuringTheBatchNeverStopIt)
     EXPECT_TRUE(NoTemporaryFiles(out.path()));
 }
 
+TEST(HostBatch, ProgressBarOnlyOnATerminal)
+{
+    TempDirectory in, out;
+    WriteFrames(in.path(), 5, SmallFrameFile());
+    const std::string command = std::string(VX_HOST_PATH) + " --handler " + VX_HANDLER_PATH +
+                                " render --jobs 2 --window 0,0,64,64 -o " + (out / "tty") + " " + in.path();
+    // script(1) gives the host a terminal and copies what it shows to stdout.
+    ProcessResult terminal = RunProgram({"script", "-qec", command, "/dev/null"});
+    EXPECT_NE(terminal.out.find("] 5/5 files "), std::string::npos) << terminal.out;
+    EXPECT_NE(terminal.out.find(" files/s "), std::string::npos) << terminal.out;
+    EXPECT_NE(terminal.out.find(" left"), std::string::npos) << terminal.out;
+    ProcessResult piped = RunHost({"render", "-o", out / "piped", in.path()});
+    EXPECT_EQ(piped.err.find('\r'), std::string::npos) << piped.err;
+    EXPECT_NE(piped.err.find("5 files: 5 rendered"), std::string::npos) << piped.err;
+}
+
 TEST(HostBatch, UnwritableOutputDirectoryIsReportedOnce)
 {
     TempDirectory in;
