@@ -14,6 +14,7 @@
 #include <fcntl.h>
 #include <iostream>
 #include <map>
+#include <regex>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -284,6 +285,20 @@ void PrintTables(const std::vector<BenchCase>& cases)
               << "%.\n";
 }
 
+// Whether the benchmark filter selects any benchmark of the case, so that a
+// filtered run surveys only the cases it times.
+bool Selected(const std::string& name)
+{
+    const std::string filter = benchmark::GetBenchmarkFilter();
+    if (filter.empty() || filter == "all" || filter[0] == '-')
+        return true;
+    const std::regex pattern(filter);
+    for (const char* prefix : {"ours_full/", "gdal_full/", "ours_window/", "gdal_window/", "limit/"})
+        if (std::regex_search(prefix + name + "/", pattern))
+            return true;
+    return false;
+}
+
 int Repetitions()
 {
     const char* text = std::getenv("VX_BENCH_REPETITIONS");
@@ -304,7 +319,7 @@ int main(int argc, char** argv)
     const std::vector<BenchCase> cases = PrepareCases(argv[1], argv[2]);
     for (const BenchCase& item : cases) {
         CaseGeometry geometry {};
-        if (Survey(rh, item, geometry))
+        if (Selected(item.name) && Survey(rh, item, geometry))
             RegisterCase(rh, item, geometry, Repetitions());
     }
     TableReporter reporter;
