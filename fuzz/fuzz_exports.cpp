@@ -20,18 +20,21 @@ namespace {
 
 constexpr uint64_t kPixelBudget = 1u << 20; // pixels drawn per input
 constexpr uint32_t kMaxRows = 4096;
+constexpr uint32_t kFailedOpenSide = 64; // the span drawn on a handle whose open failed
 
 void Draw(RHHandle& handle)
 {
-    const uint32_t width = handle.width;
+    const bool described = handle.status == kStatusOk;
+    const uint32_t width = described ? handle.width : kFailedOpenSide;
+    const uint32_t height = described ? handle.height : kFailedOpenSide;
     if (width > uint32_t(INT32_MAX))
         return;
-    const int32_t rect[4] = {0, 0, int32_t(width), int32_t(std::min<uint32_t>(handle.height, INT32_MAX))};
+    const int32_t rect[4] = {0, 0, int32_t(width), int32_t(std::min<uint32_t>(height, INT32_MAX))};
     uint32_t rowWidth = 0;
     if (RH_StartDraw(&handle, nullptr, rect, 1.0, &rowWidth) != 1)
         return;
     const uint64_t budgetRows = kPixelBudget / std::max<uint32_t>(width, 1);
-    const uint32_t rows = uint32_t(std::min<uint64_t>({handle.height, budgetRows, kMaxRows}));
+    const uint32_t rows = uint32_t(std::min<uint64_t>({height, budgetRows, kMaxRows}));
     const size_t rowBytes = size_t(rowWidth) * (handle.pixelKind == kPixelDirect ? 3 : 1);
     volatile uint8_t sink = 0;
     for (uint32_t row = 0; row < rows && handle.handler != nullptr; ++row) {
@@ -56,16 +59,16 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size)
     RH_IsFormat(path);
 
     RHHandle handle{};
-    const int32_t opened = RH_Open(&handle, path);
+    RH_Open(&handle, path);
     if (handle.handler == nullptr)
         return 0;
-    if (opened == 1 && handle.status == kStatusOk) {
-        if (handle.palette != nullptr && handle.palette->entryCount > 0) {
-            volatile uint8_t last = handle.palette->entries[size_t(handle.palette->entryCount) * 3 - 1];
-            (void)last;
-        }
-        Draw(handle);
+    if (handle.palette != nullptr && handle.palette->entryCount > 0) {
+        volatile uint8_t last = handle.palette->entries[size_t(handle.palette->entryCount) * 3 - 1];
+        (void)last;
     }
+    // A host may draw a handle whose open failed but left the handler
+    // attached (status 5): that must fail cleanly too.
+    Draw(handle);
     if (handle.handler != nullptr)
         RH_Close(&handle);
     return 0;
