@@ -73,6 +73,27 @@ TEST(HostBatch, DirectoryOfMostlyOtherFilesRendersTheRecognisedOnes)
     EXPECT_EQ(FilesBelow(out.path()), (std::vector<std::string>{"deeper/still/frame.ntf.tif", "utm.ntf.tif"}));
 }
 
+// A file cut in half is not taken for this format; a frame whose sections are
+// missing fails at open. Both are reported in the summary, the next file is rendered.
+TEST(HostBatch, DamagedFilesAreReportedAndTheBatchGoesOn)
+{
+    TempDirectory in, out;
+    const std::string whole = UtmRgbImage();
+    WriteFile(in / "a_cut.ntf", whole.substr(0, whole.size() / 2));
+    WriteFile(in / "b_broken.ntf", BrokenFrame());
+    WriteFile(in / "c_whole.ntf", whole);
+    ProcessResult result = RunHost({"render", "--jobs", "1", "-o", out.path(), in.path()});
+    EXPECT_EQ(result.exitCode, 1) << result.err;
+    EXPECT_NE(result.err.find("b_broken.ntf: the handler could not open it (result 0, status 5)"),
+              std::string::npos)
+        << result.err;
+    EXPECT_NE(result.err.find("3 files: 1 rendered (0 with 0 undecodable rows), 2 refused (1 not recognised, "
+                              "1 not opened, 0 vanished)"),
+              std::string::npos)
+        << result.err;
+    EXPECT_EQ(FilesBelow(out.path()), std::vector<std::string>{"c_whole.ntf.tif"});
+}
+
 TEST(HostBatch, NamedFilesThatAreGoneAreReportedAndTheRestRendered)
 {
     TempDirectory in, out;

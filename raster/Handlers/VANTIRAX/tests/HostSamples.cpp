@@ -34,6 +34,22 @@ std::string ImageFile(const NitfImageSpec& spec)
     return BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, Pattern)));
 }
 
+NitfImageSpec UtmRgbSpec()
+{
+    NitfImageSpec spec;
+    spec.rows = kUtmRows;
+    spec.columns = kUtmColumns;
+    spec.IREP = "RGB";
+    spec.bands = {NitfBandSpec{"R", 0, 0, ""}, NitfBandSpec{"G", 0, 0, ""}, NitfBandSpec{"B", 0, 0, ""}};
+    spec.IMODE = 'P';
+    spec.ICORDS = 'N';
+    const double east = kUtmWest + kUtmColumns * kUtmPixel;
+    const double south = kUtmNorth - kUtmRows * kUtmPixel;
+    spec.IGEOLO = UtmSlot(kUtmWest, kUtmNorth) + UtmSlot(east, kUtmNorth) + UtmSlot(east, south) +
+                  UtmSlot(kUtmWest, south);
+    return spec;
+}
+
 } // namespace
 
 std::string FrameFile(const RpfCorners& corners, RpfProduct product, const std::set<uint32_t>& maskedSubframes)
@@ -56,18 +72,7 @@ std::string SmallFrameFile(const RpfCorners& corners)
 
 std::string UtmRgbImage()
 {
-    NitfImageSpec spec;
-    spec.rows = kUtmRows;
-    spec.columns = kUtmColumns;
-    spec.IREP = "RGB";
-    spec.bands = {NitfBandSpec{"R", 0, 0, ""}, NitfBandSpec{"G", 0, 0, ""}, NitfBandSpec{"B", 0, 0, ""}};
-    spec.IMODE = 'P';
-    spec.ICORDS = 'N';
-    const double east = kUtmWest + kUtmColumns * kUtmPixel;
-    const double south = kUtmNorth - kUtmRows * kUtmPixel;
-    spec.IGEOLO = UtmSlot(kUtmWest, kUtmNorth) + UtmSlot(east, kUtmNorth) + UtmSlot(east, south) +
-                  UtmSlot(kUtmWest, south);
-    return ImageFile(spec);
+    return ImageFile(UtmRgbSpec());
 }
 
 std::string RotatedGreyImage()
