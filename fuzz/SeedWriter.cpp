@@ -221,6 +221,15 @@ void MgrsReferences(Seeds& seeds)
     int index = 0;
     for (const char* reference : references)
         seeds.Write("mgrs", "reference" + std::to_string(index++), reference);
+    // ICORDS and IGEOLO of every corner form.
+    const char* corners[] = {
+        "G400000N1000000W400000N0993000W393000N0993000W393000N1000000W",
+        "D+40.000-100.000+40.000-099.500+39.500-099.500+39.500-100.000",
+        "U18SUJ233710651918SUJ234710651918SUJ234710641918SUJ2337106419",
+        "N185000004500000185001004500000185001004499900185000004499900",
+        "S185000004500000185001004500000185001004499900185000004499900"};
+    for (const char* corner : corners)
+        seeds.Write("mgrs", "corners" + std::to_string(index++), corner);
 }
 
 } // namespace

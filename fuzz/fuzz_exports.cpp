@@ -18,7 +18,7 @@ int32_t RH_Close(RHHandle* handle);
 
 namespace {
 
-constexpr uint64_t kPixelBudget = 1u << 20; // pixels drawn per input
+constexpr uint64_t kPixelBudget = 1u << 18; // pixels drawn per input
 constexpr uint32_t kMaxRows = 4096;
 constexpr uint32_t kFailedOpenSide = 64; // the span drawn on a handle whose open failed
 
