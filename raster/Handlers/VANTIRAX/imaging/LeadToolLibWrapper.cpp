@@ -21,7 +21,7 @@ constexpr uint8_t kEndOfImage = 0xD9;
 constexpr uint8_t kApp6 = 0xE6;
 constexpr uint8_t kDefineHuffmanTables = 0xC4;
 constexpr uint8_t kDefineQuantisationTables = 0xDB;
-constexpr uint32_t kScanChunkSize = 100;
+constexpr uint32_t kScanChunkSize = 32 * 1024; // one read per chunk: a stream costs few system calls
 constexpr uint32_t kLargestReaderOffset = 0x7FFFFFFF;   // CFileReader seeks take 32-bit signed offsets
 
 // The smallest JPEG stream a block can be: SOI, a one-component frame
@@ -43,7 +43,7 @@ bool IsUnservedDepth(uint32_t NBPP)
     return NBPP == 12 || NBPP == 16;
 }
 
-// Walks the FF xx pairs of the file from a start offset, reading 100 bytes
+// Walks the FF xx pairs of the file from a start offset, reading a chunk
 // at a time. Segment payloads are not skipped: every pair counts. The scan
 // ends at a short read, after the bytes that read did deliver.
 struct MarkerScanner {
