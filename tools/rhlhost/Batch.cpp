@@ -1,5 +1,6 @@
 #include "Batch.h"
 
+#include "BatchSummary.h"
 #include "ExitCodes.h"
 #include "FileWalk.h"
 #include "OutputFile.h"
@@ -17,18 +18,6 @@ namespace {
 
 namespace fs = std::filesystem;
 
-enum class FileResult { Rendered, NotRecognised, NotOpened, Vanished, Failed };
-
-struct FileOutcome {
-    FileResult result = FileResult::Rendered;
-    uint32_t failedRows = 0;
-};
-
-struct Summary {
-    size_t files = 0, rendered = 0, withFailedRows = 0, failedRows = 0;
-    size_t notRecognised = 0, notOpened = 0, vanished = 0, failed = 0;
-};
-
 bool Exists(const std::string& path)
 {
     std::error_code error;
@@ -40,9 +29,6 @@ public:
     Batch(const Exports& rh, const BatchOptions& options, std::vector<InputFile> files)
         : rh_(rh), options_(options), files_(std::move(files)), outcomes_(files_.size()), progress_(files_.size())
     {
-        OutputFormat format = OutputFormat::GeoTiff;
-        FormatFromName(options_.extension, format);
-        format_ = format;
     }
 
     void Run()
@@ -112,53 +98,9 @@ private:
     const std::vector<InputFile> files_;
     std::vector<FileOutcome> outcomes_;
     Progress progress_;
-    OutputFormat format_;
+    const OutputFormat format_ = options_.extension == ".png" ? OutputFormat::Png : OutputFormat::GeoTiff;
     std::atomic<size_t> next_{0};
 };
-
-Summary Summarise(const std::vector<FileOutcome>& outcomes)
-{
-    Summary s;
-    s.files = outcomes.size();
-    for (const FileOutcome& outcome : outcomes) {
-        switch (outcome.result) {
-        case FileResult::Rendered:
-            ++s.rendered;
-            s.withFailedRows += outcome.failedRows > 0;
-            s.failedRows += outcome.failedRows;
-            break;
-        case FileResult::NotRecognised:
-            ++s.notRecognised;
-            break;
-        case FileResult::NotOpened:
-            ++s.notOpened;
-            break;
-        case FileResult::Vanished:
-            ++s.vanished;
-            break;
-        case FileResult::Failed:
-            ++s.failed;
-            break;
-        }
-    }
-    return s;
-}
-
-std::string SummaryLine(const Summary& s)
-{
-    return std::to_string(s.files) + " files: " + std::to_string(s.rendered) + " rendered (" +
-           std::to_string(s.withFailedRows) + " with " + std::to_string(s.failedRows) + " undecodable rows), " +
-           std::to_string(s.notRecognised + s.notOpened + s.vanished) + " refused (" +
-           std::to_string(s.notRecognised) + " not recognised, " + std::to_string(s.notOpened) + " not opened, " +
-           std::to_string(s.vanished) + " vanished), " + std::to_string(s.failed) + " failed to write";
-}
-
-int ExitCode(const Summary& s, size_t problems)
-{
-    if (s.notOpened + s.vanished + s.failed + problems > 0)
-        return kExitRefused;
-    return s.failedRows > 0 ? kExitRowsFailed : kExitOk;
-}
 
 } // namespace
 
@@ -188,7 +130,7 @@ int RunBatch(const Exports& rh, const BatchOptions& options)
     batch.Run();
     const Summary summary = Summarise(batch.Outcomes());
     std::fprintf(stderr, "rhlhost: %s\n", SummaryLine(summary).c_str());
-    return ExitCode(summary, problems.size());
+    return SummaryExitCode(summary, problems.size());
 }
 
 } // namespace host
