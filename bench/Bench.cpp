@@ -24,6 +24,8 @@ constexpr int32_t kWindowSize = 512;
 constexpr int32_t kWindowSkew = 3; // keeps the window off block and subframe borders
 constexpr int kDefaultRepetitions = 5;
 constexpr double kMinTimeSeconds = 0.2;
+constexpr int kLargeJpegSize = 16384;      // the image whose open the memory figure measures
+constexpr int kLargeJpegBlockSize = 1024;
 
 struct Window {
     int32_t x0, y0, x1, y1;
@@ -311,8 +313,12 @@ int Repetitions()
 int main(int argc, char** argv)
 {
     benchmark::Initialize(&argc, argv);
+    GDALAllRegister();
+    if (argc == 3 && std::string(argv[1]) == "--write-large-jpeg")
+        return WriteJpegImage(argv[2], kLargeJpegSize, kLargeJpegBlockSize) ? 0 : 1;
     if (argc != 3) {
-        std::cerr << "usage: vx_bench [benchmark flags] DATA_DIR CORPUS_DIR\n";
+        std::cerr << "usage: vx_bench [benchmark flags] DATA_DIR CORPUS_DIR\n"
+                     "       vx_bench --write-large-jpeg PATH\n";
         return 2;
     }
     const HandlerExports& rh = LoadHandler(VX_HANDLER_PATH);

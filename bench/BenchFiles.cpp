@@ -196,7 +196,6 @@ bool WriteJpegImage(const std::string& path, int size, int blockSize)
 
 std::vector<BenchCase> PrepareCases(const std::string& dataDir, const std::string& corpusDir)
 {
-    GDALAllRegister();
     ::mkdir(dataDir.c_str(), 0755);
     std::vector<BenchCase> cases;
     AddCorpusFrame(corpusDir, "cadrg", "rpf/cadrg/001zc013.on1", cases);

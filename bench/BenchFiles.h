@@ -12,7 +12,8 @@ struct BenchCase {
     bool jpeg = false; // the limit includes decoding the JPEG streams
 };
 
-// Writes the synthetic files that dataDir lacks and lists every case whose
+// Writes the synthetic files that dataDir lacks (GDAL's drivers registered)
+// and lists every case whose
 // file is present.
 std::vector<BenchCase> PrepareCases(const std::string& dataDir, const std::string& corpusDir);
 
