@@ -1,5 +1,5 @@
-// Ten thousand handles through the loaded handler, opened, drawn and closed
-// in every way a host meets: good files of every kind, failed opens (no
+// Ten thousand handles through the loaded handler, probed, opened, drawn and
+// closed in every way a host meets: good files of every kind, failed opens (no
 // file, a damaged header, a kind that is not served) and failed draws (a
 // reversed column span, a file gone before the draw). Open file descriptors
 // and heap in use must stay where they were.
@@ -89,6 +89,7 @@ void OneHandle(const HandlerExports& rh, const Samples& samples, unsigned kind)
     case 1:
     case 2:
     case 3: {
+        ASSERT_EQ(rh.isFormat(samples.good[kind % 8].c_str()), 1);
         const DrawResult result = OpenDrawClose(rh, samples.good[kind % 8], kRowsPerDraw);
         ASSERT_EQ(result.status, kStatusOk);
         ASSERT_EQ(result.failedRows, 0u);
@@ -97,6 +98,8 @@ void OneHandle(const HandlerExports& rh, const Samples& samples, unsigned kind)
     case 4: {
         OpenedImage damaged(rh, samples.damagedHeader);
         OpenedImage missing(rh, samples.missing);
+        ASSERT_EQ(rh.isFormat(samples.damagedHeader.c_str()), 0);
+        ASSERT_EQ(rh.isFormat(samples.notServed.c_str()), 0);
         ASSERT_EQ(damaged.result, 0);
         ASSERT_EQ(missing.result, 0);
         break;
