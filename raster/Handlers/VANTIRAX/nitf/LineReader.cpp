@@ -113,7 +113,10 @@ bool CNitfImage::ReadSpan(CFileReader& reader, uint64_t position, uint64_t count
 {
     if (count > lineBuffer.size() || position > readLimit || count > readLimit - position)
         return false;
-    reader.SeekTo(static_cast<int32_t>(position), kSeekSet);
+    // Spans that follow one another in the file (the bands of a row stored
+    // by row) need no seek between them.
+    if (reader.position != position)
+        reader.SeekTo(static_cast<int32_t>(position), kSeekSet);
     if (reader.error == kSeekFailed || reader.position != position)
         return false;
     reader.ReadBytes(lineBuffer.data(), static_cast<uint32_t>(count));
@@ -126,6 +129,16 @@ void CNitfImage::ScatterBand(const uint8_t* source, uint32_t sourceStride, uint3
                              uint8_t* out) const
 {
     const size_t outStride = size_t(NBANDS);
+    if (source != nullptr && bytesPerPixel == 1) {
+        // 8-bit samples are copied as they stand.
+        if (outStride == 1 && sourceStride == 1) {
+            std::memcpy(out, source, n);
+            return;
+        }
+        for (uint32_t i = 0; i < n; ++i)
+            out[i * outStride + size_t(band)] = source[size_t(i) * sourceStride];
+        return;
+    }
     for (uint32_t i = 0; i < n; ++i)
         out[i * outStride + size_t(band)] = source == nullptr ? 0 : ConvertPixel(source + size_t(i) * sourceStride);
 }
