@@ -6,6 +6,7 @@
 #include "nitf/NitfImage.h"
 #include "tests/fixtures/BiLevelWriter.h"
 #include "tests/fixtures/JpegBlockWriter.h"
+#include "tests/fixtures/LosslessJpegWriter.h"
 #include "tests/fixtures/NitfFileWriter.h"
 #include "tests/fixtures/NitfImageWriter.h"
 #include "tests/fixtures/RpfFrameWriter.h"
@@ -155,6 +156,24 @@ void CompressedFiles(Seeds& seeds)
     }
 }
 
+// Lossless (SOF3) streams of every predictor, with restarts and a point
+// transform, as the JPEG target's input: one 16 x 16 block.
+void LosslessStreams(Seeds& seeds)
+{
+    for (int components : {1, 3})
+        for (int predictor = 1; predictor <= 7; ++predictor) {
+            LosslessJpegSpec spec;
+            spec.components = components;
+            spec.predictor = predictor;
+            spec.pointTransform = predictor % 3;
+            spec.restartRows = predictor % 2 ? 4 : 0;
+            const Bytes stream = EncodeLosslessJpeg(TestPattern(16, 16, components, unsigned(predictor)), spec);
+            seeds.Write("jpeg", "lossless" + std::to_string(components) + "_" + std::to_string(predictor),
+                        Prefix({uint32_t(components == 3), 0, 15, 15, 1, 0}, {1, 1, 2, 2, 1, 1}) +
+                            AsString(BuildNitfJpegData({stream}, NitfApp6Spec{})));
+        }
+}
+
 void RpfFiles(Seeds& seeds)
 {
     RpfFrameSpec cadrg;
@@ -243,6 +262,7 @@ int main(int argc, char** argv)
     Seeds seeds{argv[1]};
     UncompressedFiles(seeds);
     CompressedFiles(seeds);
+    LosslessStreams(seeds);
     RpfFiles(seeds);
     MgrsReferences(seeds);
 
