@@ -109,6 +109,7 @@ void CNitfImage::ClearParsed()
 void CNitfImage::Release()
 {
     FreeVector(lineBuffer);
+    ReleaseBlockCache();
     ClearParsed();
     decoder.FreeBitmaps();
 }

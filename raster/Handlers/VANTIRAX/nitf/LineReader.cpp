@@ -8,6 +8,8 @@
 namespace {
 
 constexpr unsigned kByteBits = 8;
+constexpr uint64_t kMaxBlockCacheBytes = uint64_t(64) << 20; // larger rows of blocks are read a row at a time
+constexpr uint64_t kNoBlock = UINT64_MAX;
 
 } // namespace
 
@@ -62,12 +64,14 @@ bool CNitfImage::ReadUncompressedBlock(CFileReader& reader, uint32_t block, uint
             return true;
         }
         const uint64_t blockStart = isMasked ? blockOffsets[block] : block * BandBlockBytes() * uint64_t(NBANDS);
+        const BlockPlace place{dataOffset + blockStart, BandBlockBytes() * uint64_t(NBANDS), block % uint32_t(NBPR)};
         const uint32_t pixelStride = uint32_t(NBANDS) * uint32_t(bytesPerPixel);
-        const uint64_t position = dataOffset + blockStart + (uint64_t(NPPBH) * rowInBlock + c0) * pixelStride;
-        if (!ReadSpan(reader, position, uint64_t(n) * pixelStride))
+        const uint64_t position = place.start + (uint64_t(NPPBH) * rowInBlock + c0) * pixelStride;
+        const uint8_t* data = nullptr;
+        if (!ReadSpan(reader, place, position, uint64_t(n) * pixelStride, data))
             return false;
         for (int32_t band = 0; band < NBANDS; ++band)
-            ScatterBand(lineBuffer.data() + size_t(band) * size_t(bytesPerPixel), pixelStride, n, band, out);
+            ScatterBand(data + size_t(band) * size_t(bytesPerPixel), pixelStride, n, band, out);
         return true;
     }
     for (int32_t band = 0; band < NBANDS; ++band) {
@@ -84,15 +88,18 @@ bool CNitfImage::ReadUncompressedBlock(CFileReader& reader, uint32_t block, uint
             blockStart = bandsApart ? (uint64_t(band) * blocks + block) * BandBlockBytes()
                                     : uint64_t(block) * BandBlockBytes() * uint64_t(NBANDS);
         }
-        if (!ReadBandSpan(reader, blockStart, band, rowInBlock, c0, n, out))
+        const uint32_t column = block % uint32_t(NBPR);
+        const BlockPlace place{dataOffset + blockStart, BandBlockBytes() * uint64_t(bandsApart ? 1 : NBANDS),
+                               bandsApart ? uint32_t(band) * uint32_t(NBPR) + column : column};
+        if (!ReadBandSpan(reader, place, band, rowInBlock, c0, n, out))
             return false;
     }
     return true;
 }
 
 // Band `band` of the span in a block stored by block ("B"), by row ("R") or
-// band-sequentially ("S", where blockStart is already that band's block).
-bool CNitfImage::ReadBandSpan(CFileReader& reader, uint64_t blockStart, int32_t band, uint32_t rowInBlock,
+// band-sequentially ("S", where the place is already that band's block).
+bool CNitfImage::ReadBandSpan(CFileReader& reader, const BlockPlace& place, int32_t band, uint32_t rowInBlock,
                               uint32_t c0, uint32_t n, uint8_t* out)
 {
     const uint64_t pixelBytes = uint64_t(bytesPerPixel);
@@ -101,18 +108,59 @@ bool CNitfImage::ReadBandSpan(CFileReader& reader, uint64_t blockStart, int32_t 
         pixelIndex += uint64_t(band) * uint64_t(NPPBH) * uint64_t(NPPBV);
     else if (IMODE() == 'R')
         pixelIndex += uint64_t(NPPBH) * (uint64_t(rowInBlock) * uint64_t(NBANDS - 1) + uint64_t(band));
-    if (!ReadSpan(reader, dataOffset + blockStart + pixelIndex * pixelBytes, n * pixelBytes))
+    const uint8_t* data = nullptr;
+    if (!ReadSpan(reader, place, place.start + pixelIndex * pixelBytes, n * pixelBytes, data))
         return false;
-    ScatterBand(lineBuffer.data(), uint32_t(pixelBytes), n, band, out);
+    ScatterBand(data, uint32_t(pixelBytes), n, band, out);
     return true;
 }
 
-// One seek and one read into the line buffer; false when the bytes are not
-// all in the file (a short final block) or do not fit the buffer.
-bool CNitfImage::ReadSpan(CFileReader& reader, uint64_t position, uint64_t count)
+void CNitfImage::ReleaseBlockCache()
+{
+    FreeVector(blockCache);
+    FreeVector(cachedBlocks);
+}
+
+// The span's bytes from the block cache, reading the whole block into its
+// slot when the slot holds another. Null when the cache is too large or the
+// block does not lie whole in the file: the caller reads the span alone.
+const uint8_t* CNitfImage::CachedSpan(CFileReader& reader, const BlockPlace& place, uint64_t position, uint64_t count)
+{
+    const uint64_t slots = uint64_t(NBPR) * uint64_t(IMODE() == 'S' ? NBANDS : 1);
+    if (place.bytes == 0 || slots * place.bytes > kMaxBlockCacheBytes || place.start > readLimit ||
+        place.bytes > readLimit - place.start || position < place.start || count > place.bytes ||
+        position - place.start > place.bytes - count || place.slot >= slots)
+        return nullptr;
+    if (blockCache.size() != slots * place.bytes) {
+        blockCache.assign(slots * place.bytes, 0);
+        cachedBlocks.assign(slots, kNoBlock);
+    }
+    uint8_t* held = blockCache.data() + place.slot * place.bytes;
+    if (cachedBlocks[place.slot] != place.start) {
+        cachedBlocks[place.slot] = kNoBlock;
+        reader.SeekTo(static_cast<int32_t>(place.start), kSeekSet);
+        if (reader.error == kSeekFailed || reader.position != place.start)
+            return nullptr;
+        reader.ReadBytes(held, static_cast<uint32_t>(place.bytes));
+        if (reader.error == kSeekFailed || reader.position - place.start != place.bytes)
+            return nullptr;
+        cachedBlocks[place.slot] = place.start;
+    }
+    return held + (position - place.start);
+}
+
+// The span's bytes, from the block cache or with one seek and one read into
+// the line buffer; false when the bytes are not all in the file (a short
+// final block) or do not fit the buffer.
+bool CNitfImage::ReadSpan(CFileReader& reader, const BlockPlace& place, uint64_t position, uint64_t count,
+                          const uint8_t*& data)
 {
     if (count > lineBuffer.size() || position > readLimit || count > readLimit - position)
         return false;
+    data = CachedSpan(reader, place, position, count);
+    if (data != nullptr)
+        return true;
+    data = lineBuffer.data();
     // Spans that follow one another in the file (the bands of a row stored
     // by row) need no seek between them.
     if (reader.position != position)

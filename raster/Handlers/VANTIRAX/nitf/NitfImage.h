@@ -94,6 +94,8 @@ public:
     // per pixel for one band, three for three bands.
     bool ReadLine(CFileReader& reader, uint32_t row, int32_t firstColumn, int32_t lastColumn, uint8_t* out);
     void ReleaseDecoder();
+    // Empties the block cache; every draw starts and ends with an empty one.
+    void ReleaseBlockCache();
 
     char ICORDS() const { return subheaderText[kIcordsPosition]; }
     char IMODE() const { return blockingText[kImodePosition]; }
@@ -111,6 +113,19 @@ private:
     uint32_t streamStart = 0;        // JPEG: the first stored block's stream
     uint32_t storedBlockCount = 0;   // JPEG: streams the decoder holds
     std::vector<uint32_t> streamIndex; // masked JPEG: decoder bitmap of each block
+    // Whole uncompressed blocks of the row of blocks being read, one slot per
+    // block column (per band and block column in IMODE "S"), so that a block
+    // costs one file read rather than one per row. Empty when they would take
+    // more than kMaxBlockCacheBytes; cachedBlocks holds each slot's file offset.
+    std::vector<uint8_t> blockCache;
+    std::vector<uint64_t> cachedBlocks;
+
+    // Where one stored block (of every band, or of one band in IMODE "S") lies.
+    struct BlockPlace {
+        uint64_t start;  // file offset
+        uint64_t bytes;
+        uint32_t slot;   // its slot in the block cache
+    };
 
     // Subheader steps.
     bool ReadFront(SubheaderCursor& cursor, uint32_t offset);
@@ -135,9 +150,11 @@ private:
     uint32_t OutputPixelBytes() const;
     bool ReadUncompressedBlock(CFileReader& reader, uint32_t block, uint32_t rowInBlock, uint32_t c0, uint32_t n,
                                uint8_t* out);
-    bool ReadBandSpan(CFileReader& reader, uint64_t blockStart, int32_t band, uint32_t rowInBlock, uint32_t c0,
+    bool ReadBandSpan(CFileReader& reader, const BlockPlace& place, int32_t band, uint32_t rowInBlock, uint32_t c0,
                       uint32_t n, uint8_t* out);
-    bool ReadSpan(CFileReader& reader, uint64_t position, uint64_t count);
+    bool ReadSpan(CFileReader& reader, const BlockPlace& place, uint64_t position, uint64_t count,
+                  const uint8_t*& data);
+    const uint8_t* CachedSpan(CFileReader& reader, const BlockPlace& place, uint64_t position, uint64_t count);
     void ScatterBand(const uint8_t* source, uint32_t sourceStride, uint32_t n, int32_t band, uint8_t* out) const;
     uint8_t ConvertPixel(const uint8_t* pixel) const;
     bool ReadCompressedBlock(uint32_t block, uint32_t rowInBlock, uint32_t c0, uint32_t c1, uint8_t* out);

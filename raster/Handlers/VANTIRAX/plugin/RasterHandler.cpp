@@ -117,6 +117,8 @@ void CRasterHandler::DoStartDraw(const int32_t rect[4], uint32_t* rowWidth)
         throw kCodeReopen;
     if (mode == kModeRpfFrame)
         RpfDrawStart(static_cast<int32_t>(width));
+    else
+        nitfImage.ReleaseBlockCache();
 }
 
 int32_t CRasterHandler::StartDraw(RHHandle* handle, const int32_t rect[4], uint32_t* rowWidth)
@@ -161,6 +163,8 @@ void CRasterHandler::DoEndDraw()
 {
     if (mode == kModeRpfFrame)
         RpfDrawEnd();
+    else
+        nitfImage.ReleaseBlockCache();
     fileReader.CloseFile();
     fileReader.handle = 0;
     fileReader.ResetState();
