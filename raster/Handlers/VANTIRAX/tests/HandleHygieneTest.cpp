@@ -14,36 +14,12 @@
 #include <functional>
 #include <unistd.h>
 
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-#define VX_SANITIZED_HEAP 1
-#elif defined(__has_feature)
-#if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
-#define VX_SANITIZED_HEAP 1
-#endif
-#endif
-
-#ifdef VX_SANITIZED_HEAP
-// The sanitizer runtime's count (gcc ships no header for it).
-extern "C" size_t __sanitizer_get_current_allocated_bytes();
-#else
-#include <malloc.h>
-#endif
-
 namespace {
 
 constexpr unsigned kHandles = 10000;
 constexpr unsigned kWarmUp = 200;
 constexpr size_t kHeapSlack = 64 * 1024; // allocator bookkeeping, not per-handle growth
 constexpr uint32_t kRowsPerDraw = 4;
-
-size_t HeapInUse()
-{
-#ifdef VX_SANITIZED_HEAP
-    return __sanitizer_get_current_allocated_bytes();
-#else
-    return mallinfo2().uordblks;
-#endif
-}
 
 size_t OpenDescriptors()
 {

@@ -5,6 +5,21 @@
 #include "tests/fixtures/NitfImageWriter.h"
 #include "tests/fixtures/RpfFrameWriter.h"
 
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+#define VX_SANITIZED_HEAP 1
+#elif defined(__has_feature)
+#if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
+#define VX_SANITIZED_HEAP 1
+#endif
+#endif
+
+#ifdef VX_SANITIZED_HEAP
+// The sanitizer runtime's count (gcc ships no header for it).
+extern "C" size_t __sanitizer_get_current_allocated_bytes();
+#else
+#include <malloc.h>
+#endif
+
 namespace {
 
 constexpr uint32_t kJpegBlockSide = 16;
@@ -118,4 +133,13 @@ DrawResult OpenDrawClose(const HandlerExports& rh, const std::string& path, uint
         result.failedRows = UINT32_MAX;
     Mix(result.digest, pixels.data(), pixels.size());
     return result;
+}
+
+size_t HeapInUse()
+{
+#ifdef VX_SANITIZED_HEAP
+    return __sanitizer_get_current_allocated_bytes();
+#else
+    return mallinfo2().uordblks;
+#endif
 }

@@ -6,6 +6,7 @@
 
 #include "tests/fixtures/HandlerLoader.h"
 
+#include <cstddef>
 #include <cstdint>
 #include <string>
 #include <vector>
@@ -28,6 +29,10 @@ struct DrawResult {
     uint64_t digest = 0;
     bool operator==(const DrawResult& other) const;
 };
+
+// Bytes of heap the process holds: the sanitizer's count in sanitized builds,
+// the C library's otherwise.
+size_t HeapInUse();
 
 // Draws full-width rows [0, maxRows) of the file (all rows when it has fewer).
 DrawResult OpenDrawClose(const HandlerExports& rh, const std::string& path, uint32_t maxRows);

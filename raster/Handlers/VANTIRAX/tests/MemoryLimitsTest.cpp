@@ -1,0 +1,73 @@
+// Images whose declared size the decoded-bitmap limits refuse: they open,
+// nothing of their declared size is allocated, and their rows fail.
+#include "tests/StressFiles.h"
+#include "tests/fixtures/BiLevelWriter.h"
+#include "tests/fixtures/JpegBlockWriter.h"
+#include "tests/fixtures/NitfImageWriter.h"
+#include "tests/fixtures/TempFiles.h"
+
+#include <gtest/gtest.h>
+
+namespace {
+
+constexpr size_t kSmallGrowth = 16u << 20; // far below any declared bitmap here
+
+// Opens the file, checks what the open allocated, and draws a narrow span
+// of its first row, which must fail while the handle stays good.
+void ExpectOpensSmallAndRowsFail(const std::string& bytes, uint32_t width)
+{
+    const HandlerExports& rh = LoadHandler(VX_HANDLER_PATH);
+    TempFile file(bytes, ".ntf");
+    const size_t before = HeapInUse();
+    OpenedImage image(rh, file.path());
+    ASSERT_TRUE(image.Ready());
+    EXPECT_EQ(image.handle.width, width);
+    EXPECT_LT(HeapInUse(), before + kSmallGrowth);
+    std::vector<uint8_t> pixels;
+    uint32_t failedRows = 0;
+    ASSERT_TRUE(image.Draw(0, 0, 64, 1, pixels, failedRows));
+    EXPECT_EQ(failedRows, 1u);
+    EXPECT_EQ(image.handle.status, kStatusOk);
+}
+
+TEST(MemoryLimits, BiLevelImageLargerThanTheBitmapCapIsNotDecoded)
+{
+    // 99,999,999 x 100 one-bit pixels: about 1.16 GiB, above the 1 GiB cap.
+    constexpr uint32_t kColumns = 99999999, kRows = 100;
+    NitfImageSpec spec;
+    spec.columns = int32_t(kColumns);
+    spec.rows = int32_t(kRows);
+    spec.NBPP = 1;
+    spec.IC = "C1";
+    spec.COMRAT = "1D  ";
+    const std::vector<uint8_t> strip = EncodeT4Strip(std::vector<uint8_t>(8 * kRows, 0), 64, kRows, false);
+    ExpectOpensSmallAndRowsFail(BuildImageFile(spec, std::string(strip.begin(), strip.end())), kColumns);
+}
+
+std::string JpegImageFile(uint32_t streamSide)
+{
+    JpegBlockSpec block;
+    block.width = block.height = streamSide;
+    const Bytes stream = EncodeJpegBlock(Bytes(size_t(streamSide) * streamSide, 0x80), block);
+    NitfImageSpec spec;
+    spec.columns = spec.rows = 16;
+    spec.IC = "C3";
+    spec.COMRAT = "00.0";
+    const Bytes data = BuildNitfJpegData({stream}, NitfApp6Spec{});
+    return BuildImageFile(spec, std::string(data.begin(), data.end()));
+}
+
+TEST(MemoryLimits, JpegStreamLargerThanItsBlockIsNotDecoded)
+{
+    const HandlerExports& rh = LoadHandler(VX_HANDLER_PATH);
+    TempFile fitting(JpegImageFile(16), ".ntf");
+    OpenedImage image(rh, fitting.path());
+    std::vector<uint8_t> pixels;
+    uint32_t failedRows = 0;
+    ASSERT_TRUE(image.Ready() && image.DrawAll(pixels, failedRows));
+    ASSERT_EQ(failedRows, 0u);
+    // The same block whose stream declares 4096 x 4096 pixels.
+    ExpectOpensSmallAndRowsFail(JpegImageFile(4096), 16);
+}
+
+} // namespace
