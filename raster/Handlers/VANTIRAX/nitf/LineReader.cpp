@@ -187,6 +187,15 @@ void CNitfImage::ScatterBand(const uint8_t* source, uint32_t sourceStride, uint3
             out[i * outStride + size_t(band)] = source[size_t(i) * sourceStride];
         return;
     }
+    if (source != nullptr && bytesPerPixel == 2) {
+        // 16-bit samples: the shift is worked out once for the span.
+        const int32_t significant = SignificantBits();
+        for (uint32_t i = 0; i < n; ++i) {
+            const uint8_t* pixel = source + size_t(i) * sourceStride;
+            out[i * outStride + size_t(band)] = TopByte(uint64_t(pixel[0]) << kByteBits | pixel[1], significant);
+        }
+        return;
+    }
     for (uint32_t i = 0; i < n; ++i)
         out[i * outStride + size_t(band)] = source == nullptr ? 0 : ConvertPixel(source + size_t(i) * sourceStride);
 }
@@ -201,7 +210,17 @@ uint8_t CNitfImage::ConvertPixel(const uint8_t* pixel) const
     uint64_t value = 0;
     for (int32_t i = 0; i < bytesPerPixel; ++i)
         value = (value << kByteBits) | pixel[i];
-    const int32_t significant = ABPP >= 1 && ABPP <= NBPP && PJUST() != 'L' ? ABPP : NBPP;
+    return TopByte(value, SignificantBits());
+}
+
+int32_t CNitfImage::SignificantBits() const
+{
+    return ABPP >= 1 && ABPP <= NBPP && PJUST() != 'L' ? ABPP : NBPP;
+}
+
+// The 8 most significant of a value's significant low bits.
+uint8_t CNitfImage::TopByte(uint64_t value, int32_t significant)
+{
     const uint64_t top = significant >= int32_t(kByteBits) ? value >> (significant - int32_t(kByteBits))
                                                           : value << (int32_t(kByteBits) - significant);
     return static_cast<uint8_t>(top & 0xFF);

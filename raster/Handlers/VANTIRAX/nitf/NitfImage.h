@@ -157,5 +157,7 @@ private:
     const uint8_t* CachedSpan(CFileReader& reader, const BlockPlace& place, uint64_t position, uint64_t count);
     void ScatterBand(const uint8_t* source, uint32_t sourceStride, uint32_t n, int32_t band, uint8_t* out) const;
     uint8_t ConvertPixel(const uint8_t* pixel) const;
+    int32_t SignificantBits() const;
+    static uint8_t TopByte(uint64_t value, int32_t significant);
     bool ReadCompressedBlock(uint32_t block, uint32_t rowInBlock, uint32_t c0, uint32_t c1, uint8_t* out);
 };
