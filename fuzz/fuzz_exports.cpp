@@ -21,30 +21,47 @@ namespace {
 constexpr uint64_t kPixelBudget = 1u << 18; // pixels drawn per input
 constexpr uint32_t kMaxRows = 4096;
 constexpr uint32_t kFailedOpenSide = 64; // the span drawn on a handle whose open failed
+constexpr uint32_t kReverseRows = 64;
 
+// Rows firstRow, firstRow + step, ... of columns [firstColumn, endColumn),
+// while the pixel budget lasts.
+void DrawSpan(RHHandle& handle, int32_t firstColumn, int32_t endColumn, uint32_t firstRow, uint32_t height,
+              int32_t step)
+{
+    const int32_t rect[4] = {firstColumn, int32_t(firstRow), endColumn, int32_t(std::min<uint32_t>(height, INT32_MAX))};
+    uint32_t rowWidth = 0;
+    if (RH_StartDraw(&handle, nullptr, rect, 1.0, &rowWidth) != 1)
+        return;
+    const uint64_t budgetRows = kPixelBudget / std::max<uint32_t>(rowWidth, 1);
+    const uint32_t rows = uint32_t(std::min<uint64_t>({height, budgetRows, kMaxRows}));
+    const size_t rowBytes = size_t(rowWidth) * (handle.pixelKind == kPixelDirect ? 3 : 1);
+    volatile uint8_t sink = 0;
+    int64_t row = firstRow;
+    for (uint32_t n = 0; n < rows && handle.handler != nullptr; ++n, row += step) {
+        uint8_t* address = nullptr;
+        uint16_t flag = 0;
+        if (RH_GetLine(&handle, uint32_t(row), &address, &flag) == 1 && address != nullptr && rowBytes > 0)
+            sink = sink ^ address[0] ^ address[rowBytes - 1]; // the whole row must be addressable
+    }
+    if (handle.handler != nullptr)
+        RH_EndDraw(&handle);
+}
+
+// The full width from the top, then an inner span from the bottom row up
+// (hosts ask for rows in any order), then a span that starts left of the image.
 void Draw(RHHandle& handle)
 {
     const bool described = handle.status == kStatusOk;
     const uint32_t width = described ? handle.width : kFailedOpenSide;
     const uint32_t height = described ? handle.height : kFailedOpenSide;
-    if (width > uint32_t(INT32_MAX))
+    if (width > uint32_t(INT32_MAX) || height == 0)
         return;
-    const int32_t rect[4] = {0, 0, int32_t(width), int32_t(std::min<uint32_t>(height, INT32_MAX))};
-    uint32_t rowWidth = 0;
-    if (RH_StartDraw(&handle, nullptr, rect, 1.0, &rowWidth) != 1)
-        return;
-    const uint64_t budgetRows = kPixelBudget / std::max<uint32_t>(width, 1);
-    const uint32_t rows = uint32_t(std::min<uint64_t>({height, budgetRows, kMaxRows}));
-    const size_t rowBytes = size_t(rowWidth) * (handle.pixelKind == kPixelDirect ? 3 : 1);
-    volatile uint8_t sink = 0;
-    for (uint32_t row = 0; row < rows && handle.handler != nullptr; ++row) {
-        uint8_t* address = nullptr;
-        uint16_t flag = 0;
-        if (RH_GetLine(&handle, row, &address, &flag) == 1 && address != nullptr && rowBytes > 0)
-            sink = sink ^ address[0] ^ address[rowBytes - 1]; // the whole row must be addressable
-    }
+    const auto end = int32_t(width);
+    DrawSpan(handle, 0, end, 0, height, 1);
     if (handle.handler != nullptr)
-        RH_EndDraw(&handle);
+        DrawSpan(handle, end / 3, end - end / 5, height - 1, std::min<uint32_t>(height, kReverseRows), -1);
+    if (handle.handler != nullptr)
+        DrawSpan(handle, -3, std::min(end, 5), 0, 1, 1);
 }
 
 } // namespace
