@@ -1,5 +1,7 @@
 #include "OutputFile.h"
 
+#include "PlatformFiles.h"
+
 #include <atomic>
 #include <cerrno>
 #include <cstdio>
@@ -26,7 +28,7 @@ OutputFile::~OutputFile()
 
 bool OutputFile::Commit(std::string& message)
 {
-    if (std::rename(temporary_.c_str(), final_.c_str()) != 0) {
+    if (!MoveReplacing(temporary_, final_)) {
         message = CannotWrite(final_);
         return false;
     }

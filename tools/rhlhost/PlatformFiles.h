@@ -1,0 +1,12 @@
+// File operations whose meaning differs between platforms
+// (PlatformFilesPosix.cpp, PlatformFilesWin32.cpp).
+#pragma once
+
+#include <string>
+
+namespace host {
+
+// Moves from over to, replacing a file already there; false with errno set.
+bool MoveReplacing(const std::string& from, const std::string& to);
+
+} // namespace host
