@@ -16,7 +16,7 @@
 namespace {
 
 constexpr unsigned kThreads = 8;
-constexpr unsigned kRounds = 3;
+constexpr unsigned kRounds = 5;
 constexpr uint32_t kRowsPerDraw = 96;
 
 // Holds every thread until all have arrived, so their first opens overlap.
