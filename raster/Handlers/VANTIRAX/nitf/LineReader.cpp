@@ -3,12 +3,14 @@
 // rows come from the decoder's bitmaps.
 #include "nitf/NitfImage.h"
 
+#include <algorithm>
 #include <cstring>
 
 namespace {
 
 constexpr unsigned kByteBits = 8;
-constexpr uint64_t kMaxBlockCacheBytes = uint64_t(64) << 20; // larger rows of blocks are read a row at a time
+constexpr uint64_t kMaxBlockCacheBytes = uint64_t(64) << 20; // larger strips are read a row at a time
+constexpr uint32_t kStripRows = 32; // rows of a block read at once: small enough to stay in the CPU caches
 constexpr uint64_t kNoBlock = UINT64_MAX;
 
 } // namespace
@@ -64,9 +66,9 @@ bool CNitfImage::ReadUncompressedBlock(CFileReader& reader, uint32_t block, uint
             return true;
         }
         const uint64_t blockStart = isMasked ? blockOffsets[block] : block * BandBlockBytes() * uint64_t(NBANDS);
-        const BlockPlace place{dataOffset + blockStart, BandBlockBytes() * uint64_t(NBANDS), block % uint32_t(NBPR)};
         const uint32_t pixelStride = uint32_t(NBANDS) * uint32_t(bytesPerPixel);
-        const uint64_t position = place.start + (uint64_t(NPPBH) * rowInBlock + c0) * pixelStride;
+        const BlockPlace place = StripPlace(dataOffset + blockStart, pixelStride, rowInBlock, block % uint32_t(NBPR));
+        const uint64_t position = dataOffset + blockStart + (uint64_t(NPPBH) * rowInBlock + c0) * pixelStride;
         const uint8_t* data = nullptr;
         if (!ReadSpan(reader, place, position, uint64_t(n) * pixelStride, data))
             return false;
@@ -88,28 +90,34 @@ bool CNitfImage::ReadUncompressedBlock(CFileReader& reader, uint32_t block, uint
             blockStart = bandsApart ? (uint64_t(band) * blocks + block) * BandBlockBytes()
                                     : uint64_t(block) * BandBlockBytes() * uint64_t(NBANDS);
         }
-        const uint32_t column = block % uint32_t(NBPR);
-        const BlockPlace place{dataOffset + blockStart, BandBlockBytes() * uint64_t(bandsApart ? 1 : NBANDS),
-                               bandsApart ? uint32_t(band) * uint32_t(NBPR) + column : column};
-        if (!ReadBandSpan(reader, place, band, rowInBlock, c0, n, out))
+        if (!ReadBandSpan(reader, blockStart, block % uint32_t(NBPR), band, rowInBlock, c0, n, out))
             return false;
     }
     return true;
 }
 
 // Band `band` of the span in a block stored by block ("B"), by row ("R") or
-// band-sequentially ("S", where the place is already that band's block).
-bool CNitfImage::ReadBandSpan(CFileReader& reader, const BlockPlace& place, int32_t band, uint32_t rowInBlock,
-                              uint32_t c0, uint32_t n, uint8_t* out)
+// band-sequentially ("S", where blockStart is already that band's block).
+bool CNitfImage::ReadBandSpan(CFileReader& reader, uint64_t blockStart, uint32_t column, int32_t band,
+                              uint32_t rowInBlock, uint32_t c0, uint32_t n, uint8_t* out)
 {
     const uint64_t pixelBytes = uint64_t(bytesPerPixel);
+    const uint64_t blockPosition = dataOffset + blockStart;
     uint64_t pixelIndex = uint64_t(NPPBH) * rowInBlock + c0;
-    if (IMODE() == 'B')
+    // The strip holding the span: of the band's plane in IMODE "B" and "S",
+    // of the rows of every band in IMODE "R".
+    const uint32_t bandSlot = uint32_t(band) * uint32_t(NBPR) + column;
+    BlockPlace place = StripPlace(blockPosition, uint32_t(pixelBytes), rowInBlock, bandSlot);
+    if (IMODE() == 'B') {
         pixelIndex += uint64_t(band) * uint64_t(NPPBH) * uint64_t(NPPBV);
-    else if (IMODE() == 'R')
+        place = StripPlace(blockPosition + uint64_t(band) * BandBlockBytes(), uint32_t(pixelBytes), rowInBlock,
+                           bandSlot);
+    } else if (IMODE() == 'R') {
         pixelIndex += uint64_t(NPPBH) * (uint64_t(rowInBlock) * uint64_t(NBANDS - 1) + uint64_t(band));
+        place = StripPlace(blockPosition, uint32_t(pixelBytes) * uint32_t(NBANDS), rowInBlock, column);
+    }
     const uint8_t* data = nullptr;
-    if (!ReadSpan(reader, place, place.start + pixelIndex * pixelBytes, n * pixelBytes, data))
+    if (!ReadSpan(reader, place, blockPosition + pixelIndex * pixelBytes, n * pixelBytes, data))
         return false;
     ScatterBand(data, uint32_t(pixelBytes), n, band, out);
     return true;
@@ -121,21 +129,37 @@ void CNitfImage::ReleaseBlockCache()
     FreeVector(cachedBlocks);
 }
 
-// The span's bytes from the block cache, reading the whole block into its
-// slot when the slot holds another. Null when the cache is too large or the
-// block does not lie whole in the file: the caller reads the span alone.
+// The strip of rows rowInBlock belongs to, in a plane of pixelBytes-byte
+// pixels (one band, or every band of a pixel or of a row) starting at
+// planeStart, cached in slot.
+CNitfImage::BlockPlace CNitfImage::StripPlace(uint64_t planeStart, uint32_t pixelBytes, uint32_t rowInBlock,
+                                              uint32_t slot) const
+{
+    const uint32_t first = rowInBlock - rowInBlock % kStripRows;
+    const uint64_t rows = std::min<uint64_t>(kStripRows, uint64_t(NPPBV) - first);
+    const uint64_t rowBytes = uint64_t(NPPBH) * pixelBytes;
+    return {planeStart + first * rowBytes, rows * rowBytes, slot};
+}
+
+// The span's bytes from the strip cache, reading the whole strip into its
+// slot when the slot holds another. Null when the cache would be too large or
+// the strip does not lie whole in the file: the caller reads the span alone.
 const uint8_t* CNitfImage::CachedSpan(CFileReader& reader, const BlockPlace& place, uint64_t position, uint64_t count)
 {
-    const uint64_t slots = uint64_t(NBPR) * uint64_t(IMODE() == 'S' ? NBANDS : 1);
-    if (place.bytes == 0 || slots * place.bytes > kMaxBlockCacheBytes || place.start > readLimit ||
-        place.bytes > readLimit - place.start || position < place.start || count > place.bytes ||
-        position - place.start > place.bytes - count || place.slot >= slots)
+    // P and R strips hold every band; B and S strips one band each.
+    const bool bandsTogether = IMODE() == 'P' || IMODE() == 'R';
+    const uint64_t slots = uint64_t(NBPR) * uint64_t(bandsTogether ? 1 : NBANDS);
+    const uint64_t slotBytes = std::min<uint64_t>(kStripRows, uint64_t(NPPBV)) * uint64_t(NPPBH) *
+                               uint64_t(bytesPerPixel) * uint64_t(bandsTogether ? NBANDS : 1);
+    if (place.bytes == 0 || place.bytes > slotBytes || slots * slotBytes > kMaxBlockCacheBytes ||
+        place.start > readLimit || place.bytes > readLimit - place.start || position < place.start ||
+        count > place.bytes || position - place.start > place.bytes - count || place.slot >= slots)
         return nullptr;
-    if (blockCache.size() != slots * place.bytes) {
-        blockCache.assign(slots * place.bytes, 0);
+    if (blockCache.size() != slots * slotBytes) {
+        blockCache.assign(slots * slotBytes, 0);
         cachedBlocks.assign(slots, kNoBlock);
     }
-    uint8_t* held = blockCache.data() + place.slot * place.bytes;
+    uint8_t* held = blockCache.data() + place.slot * slotBytes;
     if (cachedBlocks[place.slot] != place.start) {
         cachedBlocks[place.slot] = kNoBlock;
         reader.SeekTo(static_cast<int32_t>(place.start), kSeekSet);

@@ -113,14 +113,14 @@ private:
     uint32_t streamStart = 0;        // JPEG: the first stored block's stream
     uint32_t storedBlockCount = 0;   // JPEG: streams the decoder holds
     std::vector<uint32_t> streamIndex; // masked JPEG: decoder bitmap of each block
-    // Whole uncompressed blocks of the row of blocks being read, one slot per
-    // block column (per band and block column in IMODE "S"), so that a block
+    // Strips of rows of the uncompressed blocks being read, one slot per block
+    // column (per band and block column in IMODE "B" and "S"), so that a strip
     // costs one file read rather than one per row. Empty when they would take
     // more than kMaxBlockCacheBytes; cachedBlocks holds each slot's file offset.
     std::vector<uint8_t> blockCache;
     std::vector<uint64_t> cachedBlocks;
 
-    // Where one stored block (of every band, or of one band in IMODE "S") lies.
+    // Where one strip of a block (of every band, or of one band) lies.
     struct BlockPlace {
         uint64_t start;  // file offset
         uint64_t bytes;
@@ -150,8 +150,9 @@ private:
     uint32_t OutputPixelBytes() const;
     bool ReadUncompressedBlock(CFileReader& reader, uint32_t block, uint32_t rowInBlock, uint32_t c0, uint32_t n,
                                uint8_t* out);
-    bool ReadBandSpan(CFileReader& reader, const BlockPlace& place, int32_t band, uint32_t rowInBlock, uint32_t c0,
-                      uint32_t n, uint8_t* out);
+    bool ReadBandSpan(CFileReader& reader, uint64_t blockStart, uint32_t column, int32_t band, uint32_t rowInBlock,
+                      uint32_t c0, uint32_t n, uint8_t* out);
+    BlockPlace StripPlace(uint64_t planeStart, uint32_t pixelBytes, uint32_t rowInBlock, uint32_t slot) const;
     bool ReadSpan(CFileReader& reader, const BlockPlace& place, uint64_t position, uint64_t count,
                   const uint8_t*& data);
     const uint8_t* CachedSpan(CFileReader& reader, const BlockPlace& place, uint64_t position, uint64_t count);
