@@ -9,6 +9,7 @@
 namespace {
 
 constexpr unsigned kByteBits = 8;
+constexpr size_t kRgbBands = 3;
 constexpr uint64_t kMaxBlockCacheBytes = uint64_t(64) << 20; // larger strips are read a row at a time
 constexpr uint32_t kStripRows = 32; // rows of a block read at once: small enough to stay in the CPU caches
 constexpr uint64_t kNoBlock = UINT64_MAX;
@@ -72,6 +73,11 @@ bool CNitfImage::ReadUncompressedBlock(CFileReader& reader, uint32_t block, uint
         const uint8_t* data = nullptr;
         if (!ReadSpan(reader, place, position, uint64_t(n) * pixelStride, data))
             return false;
+        if (bytesPerPixel == 1) {
+            // 8-bit pixels stored as they are delivered: band after band.
+            std::memcpy(out, data, size_t(n) * pixelStride);
+            return true;
+        }
         for (int32_t band = 0; band < NBANDS; ++band)
             ScatterBand(data + size_t(band) * size_t(bytesPerPixel), pixelStride, n, band, out);
         return true;
@@ -205,6 +211,13 @@ void CNitfImage::ScatterBand(const uint8_t* source, uint32_t sourceStride, uint3
         // 8-bit samples are copied as they stand.
         if (outStride == 1 && sourceStride == 1) {
             std::memcpy(out, source, n);
+            return;
+        }
+        if (outStride == kRgbBands && sourceStride == 1) {
+            // One band of an RGB row: a constant stride the compiler can unroll.
+            uint8_t* target = out + band;
+            for (uint32_t i = 0; i < n; ++i)
+                target[size_t(i) * kRgbBands] = source[i];
             return;
         }
         for (uint32_t i = 0; i < n; ++i)
