@@ -82,6 +82,9 @@ bool CNitfImage::ReadUncompressedBlock(CFileReader& reader, uint32_t block, uint
             ScatterBand(data + size_t(band) * size_t(bytesPerPixel), pixelStride, n, band, out);
         return true;
     }
+    // 8-bit RGB bands read from the cache are interleaved in one pass at the end.
+    const uint8_t* held[kRgbBands] = {};
+    const bool interleave = NBANDS == int32_t(kRgbBands) && bytesPerPixel == 1;
     for (int32_t band = 0; band < NBANDS; ++band) {
         uint64_t blockStart = 0;
         if (isMasked) {
@@ -96,16 +99,37 @@ bool CNitfImage::ReadUncompressedBlock(CFileReader& reader, uint32_t block, uint
             blockStart = bandsApart ? (uint64_t(band) * blocks + block) * BandBlockBytes()
                                     : uint64_t(block) * BandBlockBytes() * uint64_t(NBANDS);
         }
-        if (!ReadBandSpan(reader, blockStart, block % uint32_t(NBPR), band, rowInBlock, c0, n, out))
+        if (!ReadBandSpan(reader, blockStart, block % uint32_t(NBPR), band, rowInBlock, c0, n, out,
+                          interleave ? &held[band] : nullptr)) {
+            ScatterHeld(held, n, out);
             return false;
+        }
     }
+    ScatterHeld(held, n, out);
     return true;
+}
+
+// Writes the RGB bands whose scatter ReadBandSpan left for later: all three
+// in one pass, or each alone when some came another way.
+void CNitfImage::ScatterHeld(const uint8_t* const held[], uint32_t n, uint8_t* out) const
+{
+    if (held[0] != nullptr && held[1] != nullptr && held[2] != nullptr) {
+        for (uint32_t i = 0; i < n; ++i) {
+            out[size_t(i) * kRgbBands] = held[0][i];
+            out[size_t(i) * kRgbBands + 1] = held[1][i];
+            out[size_t(i) * kRgbBands + 2] = held[2][i];
+        }
+        return;
+    }
+    for (size_t band = 0; band < kRgbBands; ++band)
+        if (held[band] != nullptr)
+            ScatterBand(held[band], 1, n, int32_t(band), out);
 }
 
 // Band `band` of the span in a block stored by block ("B"), by row ("R") or
 // band-sequentially ("S", where blockStart is already that band's block).
 bool CNitfImage::ReadBandSpan(CFileReader& reader, uint64_t blockStart, uint32_t column, int32_t band,
-                              uint32_t rowInBlock, uint32_t c0, uint32_t n, uint8_t* out)
+                              uint32_t rowInBlock, uint32_t c0, uint32_t n, uint8_t* out, const uint8_t** deferred)
 {
     const uint64_t pixelBytes = uint64_t(bytesPerPixel);
     const uint64_t blockPosition = dataOffset + blockStart;
@@ -125,6 +149,12 @@ bool CNitfImage::ReadBandSpan(CFileReader& reader, uint64_t blockStart, uint32_t
     const uint8_t* data = nullptr;
     if (!ReadSpan(reader, place, blockPosition + pixelIndex * pixelBytes, n * pixelBytes, data))
         return false;
+    // Bytes in the strip cache stay put until the row is done; the line
+    // buffer is overwritten by the next band's read.
+    if (deferred != nullptr && data != lineBuffer.data()) {
+        *deferred = data;
+        return true;
+    }
     ScatterBand(data, uint32_t(pixelBytes), n, band, out);
     return true;
 }

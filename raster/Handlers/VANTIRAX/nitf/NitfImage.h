@@ -150,8 +150,11 @@ private:
     uint32_t OutputPixelBytes() const;
     bool ReadUncompressedBlock(CFileReader& reader, uint32_t block, uint32_t rowInBlock, uint32_t c0, uint32_t n,
                                uint8_t* out);
+    // Scatters the band's span into out, or leaves its address in *deferred
+    // when that is given and the bytes stay in the strip cache.
     bool ReadBandSpan(CFileReader& reader, uint64_t blockStart, uint32_t column, int32_t band, uint32_t rowInBlock,
-                      uint32_t c0, uint32_t n, uint8_t* out);
+                      uint32_t c0, uint32_t n, uint8_t* out, const uint8_t** deferred);
+    void ScatterHeld(const uint8_t* const held[], uint32_t n, uint8_t* out) const;
     BlockPlace StripPlace(uint64_t planeStart, uint32_t pixelBytes, uint32_t rowInBlock, uint32_t slot) const;
     bool ReadSpan(CFileReader& reader, const BlockPlace& place, uint64_t position, uint64_t count,
                   const uint8_t*& data);
