@@ -232,11 +232,31 @@ bool RpfImageSection::ReadCodeRow(CFileReader& reader, uint32_t imageRow, uint32
     return true;
 }
 
+namespace {
+
+// UnpackCodes when every code's bytes are there: a pair of codes per three bytes.
+void UnpackWholeCodes(const uint8_t* packed, uint16_t* codes, uint32_t codeCount)
+{
+    uint32_t index = 0;
+    for (; index + 1 < codeCount; index += 2, packed += 3) {
+        codes[index] = static_cast<uint16_t>(packed[0] << 4 | packed[1] >> 4);
+        codes[index + 1] = static_cast<uint16_t>((packed[1] & 0x0F) << 8 | packed[2]);
+    }
+    if (index < codeCount)
+        codes[index] = static_cast<uint16_t>(packed[0] << 4 | packed[1] >> 4);
+}
+
+} // namespace
+
 bool UnpackCodes(const uint8_t* packed, uint32_t byteCount, uint16_t* codes, uint32_t codeCount,
                  uint8_t codeBitLength)
 {
     if (codeBitLength != kCodeBits)
         return false;
+    if ((uint64_t(codeCount) + 1) / 2 * 3 <= byteCount) {
+        UnpackWholeCodes(packed, codes, codeCount);
+        return true;
+    }
     // A code whose last bits lie past byteCount takes zero bits from there.
     auto byteAt = [&](uint64_t index) -> uint16_t { return index < byteCount ? packed[index] : 0; };
     uint64_t consumed = 0;
