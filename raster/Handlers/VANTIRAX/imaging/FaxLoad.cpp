@@ -10,6 +10,11 @@
 
 namespace {
 
+// libtiff's own working memory grows with the declared width alone (its
+// run arrays take 16 bytes per column), which a few bytes of strip can
+// claim: no single allocation of it may pass this.
+constexpr tmsize_t kMaxLibraryAllocation = tmsize_t(256) << 20;
+
 struct MemoryTiff {
     const uint8_t* data;
     uint64_t size;
@@ -111,6 +116,7 @@ bool LoadFaxTiff(const LoadRequest& request)
         return false;
     TIFFOpenOptionsSetErrorHandlerExtR(options, DropMessage, nullptr);
     TIFFOpenOptionsSetWarningHandlerExtR(options, DropMessage, nullptr);
+    TIFFOpenOptionsSetMaxSingleMemAlloc(options, kMaxLibraryAllocation);
     MemoryTiff file {request.data, request.size, 0};
     TIFF* tiff = TIFFClientOpenExt("nitf-bilevel", "rm", &file, ReadMemory, RefuseWrite, SeekMemory, CloseMemory,
                                    MemorySize, RefuseMap, NoUnmap, options);
