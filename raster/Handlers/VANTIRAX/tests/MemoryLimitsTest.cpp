@@ -44,6 +44,37 @@ TEST(MemoryLimits, BiLevelImageLargerThanTheBitmapCapIsNotDecoded)
     ExpectOpensSmallAndRowsFail(BuildImageFile(spec, std::string(strip.begin(), strip.end())), kColumns);
 }
 
+// A white bi-level image of the given width, two rows, coded two-dimensionally.
+std::string WideBiLevelFile(uint32_t columns)
+{
+    constexpr uint32_t kRows = 2;
+    NitfImageSpec spec;
+    spec.columns = int32_t(columns);
+    spec.rows = int32_t(kRows);
+    spec.NBPP = 1;
+    spec.IC = "C1";
+    spec.COMRAT = "2DS ";
+    const std::vector<uint8_t> white(size_t((columns + 7) / 8) * kRows, 0);
+    const std::vector<uint8_t> strip = EncodeT4Strip(white, columns, kRows, true);
+    return BuildImageFile(spec, std::string(strip.begin(), strip.end()));
+}
+
+TEST(MemoryLimits, BiLevelImageWhoseDecoderWouldNeedOverAQuarterGibibyteIsNotDecoded)
+{
+    // The bitmap is small (2 MiB), but the fax decoder's run arrays for
+    // 17 million columns would take 272 MB: such strips of a few kilobytes
+    // made it allocate over a gibibyte.
+    const HandlerExports& rh = LoadHandler(VX_HANDLER_PATH);
+    TempFile fitting(WideBiLevelFile(1000000), ".ntf");
+    OpenedImage image(rh, fitting.path());
+    std::vector<uint8_t> pixels;
+    uint32_t failedRows = 0;
+    ASSERT_TRUE(image.Ready() && image.Draw(0, 0, 64, 2, pixels, failedRows));
+    ASSERT_EQ(failedRows, 0u);
+    EXPECT_EQ(pixels, std::vector<uint8_t>(128, 255));
+    ExpectOpensSmallAndRowsFail(WideBiLevelFile(17000000), 17000000);
+}
+
 std::string JpegImageFile(uint32_t streamSide)
 {
     JpegBlockSpec block;
