@@ -168,10 +168,16 @@ bool ReadFrame(const uint8_t* segment, size_t length, const LOADFILEOPTION& opti
         (frame.componentCount != 1 && frame.componentCount != kMaxComponents) ||
         length != 6 + 3 * size_t(frame.componentCount))
         return false;
+    // Each component specification is three bytes: identifier, sampling
+    // factors, quantisation table. The count is 1 or 3 here.
     for (unsigned c = 0; c < frame.componentCount; ++c) {
-        frame.componentIds[c] = segment[6 + 3 * c];
         if (segment[7 + 3 * c] != kUnsubsampled)
             return false;
+    }
+    frame.componentIds[0] = segment[6];
+    if (frame.componentCount == kMaxComponents) {
+        frame.componentIds[1] = segment[9];
+        frame.componentIds[2] = segment[12];
     }
     state.hasFrame = true;
     return ShapeBitmap(bitmap, frame.width, frame.height, frame.componentCount == 1 ? 8 : 24, options);
