@@ -86,24 +86,24 @@ std::vector<std::string> BlockOptions(int blockSize)
 // writes only one interleave).
 bool WriteUncompressedImage(const std::string& path, bool rgb, char imode)
 {
-    NitfImageSpec spec;
-    spec.rows = spec.columns = kImageSize;
-    spec.NPPBH = spec.NPPBV = kBlockSize;
-    spec.NBPR = spec.NBPC = kImageSize / kBlockSize;
-    spec.IMODE = imode;
-    spec.IREP = rgb ? "RGB" : "MONO";
-    spec.NBPP = rgb ? 8 : 16;
-    spec.bands.assign(rgb ? kRgbBands : 1, NitfBandSpec{});
+    NitfImageSpec plan;
+    plan.rows = plan.columns = kImageSize;
+    plan.NPPBH = plan.NPPBV = kBlockSize;
+    plan.NBPR = plan.NBPC = kImageSize / kBlockSize;
+    plan.IMODE = imode;
+    plan.IREP = rgb ? "RGB" : "MONO";
+    plan.NBPP = rgb ? 8 : 16;
+    plan.bands.assign(rgb ? kRgbBands : 1, NitfBandSpec{});
     if (rgb) {
-        spec.bands[0].IREPBAND = "R";
-        spec.bands[1].IREPBAND = "G";
-        spec.bands[2].IREPBAND = "B";
+        plan.bands[0].IREPBAND = "R";
+        plan.bands[1].IREPBAND = "G";
+        plan.bands[2].IREPBAND = "B";
     }
     const PixelValue pixel = [rgb](int32_t band, int32_t row, int32_t column) -> uint64_t {
         return rgb ? RgbValue(band, column, row) : MonoValue(column, row);
     };
     std::ofstream out(path, std::ios::binary);
-    out << BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, pixel)));
+    out << BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, pixel)));
     return static_cast<bool>(out);
 }
 
@@ -164,14 +164,14 @@ bool WriteBiLevel(const std::string& path)
     const std::string strip = FaxStrip(path + ".tif", kBiLevelSize);
     if (strip.empty())
         return false;
-    NitfImageSpec spec;
-    spec.rows = spec.columns = kBiLevelSize;
-    spec.IREP = "MONO";
-    spec.IC = "C1";
-    spec.COMRAT = "1D  ";
-    spec.NBPP = 1;
+    NitfImageSpec plan;
+    plan.rows = plan.columns = kBiLevelSize;
+    plan.IREP = "MONO";
+    plan.IC = "C1";
+    plan.COMRAT = "1D  ";
+    plan.NBPP = 1;
     std::ofstream out(path, std::ios::binary);
-    out << BuildImageFile(spec, strip);
+    out << BuildImageFile(plan, strip);
     return static_cast<bool>(out);
 }
 

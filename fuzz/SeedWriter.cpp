@@ -59,28 +59,28 @@ PixelValue Pattern()
 
 NitfImageSpec Image(const std::string& IREP, int32_t bands, char IMODE)
 {
-    NitfImageSpec spec;
-    spec.rows = 20;
-    spec.columns = 24;
-    spec.NBPR = 2;
-    spec.NBPC = 2;
-    spec.NPPBH = 16;
-    spec.NPPBV = 16;
-    spec.IREP = IREP;
-    spec.IMODE = IMODE;
-    spec.bands.assign(size_t(bands), NitfBandSpec{});
+    NitfImageSpec plan;
+    plan.rows = 20;
+    plan.columns = 24;
+    plan.NBPR = 2;
+    plan.NBPC = 2;
+    plan.NPPBH = 16;
+    plan.NPPBV = 16;
+    plan.IREP = IREP;
+    plan.IMODE = IMODE;
+    plan.bands.assign(size_t(bands), NitfBandSpec{});
     if (bands == 3)
         for (int32_t band = 0; band < 3; ++band)
-            spec.bands[size_t(band)].IREPBAND = std::string(1, "RGB"[band]);
-    return spec;
+            plan.bands[size_t(band)].IREPBAND = std::string(1, "RGB"[band]);
+    return plan;
 }
 
 void UncompressedFiles(Seeds& seeds)
 {
     for (char mode : {'B', 'P', 'R', 'S'}) {
-        NitfImageSpec spec = Image("RGB", 3, mode);
+        NitfImageSpec plan = Image("RGB", 3, mode);
         seeds.Write("exports", std::string("rgb_") + mode + ".ntf",
-                    BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, Pattern()))));
+                    BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, Pattern()))));
     }
     NitfImageSpec lut = Image("RGB/LUT", 1, 'B');
     lut.bands[0] = NitfBandSpec{"LU", 3, 200, RgbLookupTables(200)};
@@ -121,11 +121,11 @@ void CompressedFiles(Seeds& seeds)
     const Bytes jpeg = BuildNitfJpegData({EncodeJpegBlock(grey, {}), EncodeJpegBlock(grey, bare),
                                           EncodeJpegBlock(grey, {}), EncodeJpegBlock(grey, {})},
                                          NitfApp6Spec{2, 2, 3, 0});
-    NitfImageSpec spec = Image("MONO", 1, 'B');
-    spec.rows = spec.columns = 32;
-    spec.IC = "C3";
-    spec.COMRAT = "00.0";
-    seeds.Write("exports", "jpeg_grey_2x2.ntf", BuildImageFile(spec, AsString(jpeg)));
+    NitfImageSpec plan = Image("MONO", 1, 'B');
+    plan.rows = plan.columns = 32;
+    plan.IC = "C3";
+    plan.COMRAT = "00.0";
+    seeds.Write("exports", "jpeg_grey_2x2.ntf", BuildImageFile(plan, AsString(jpeg)));
 
     JpegBlockSpec colour;
     colour.components = 3;
@@ -162,12 +162,12 @@ void LosslessStreams(Seeds& seeds)
 {
     for (int components : {1, 3})
         for (int predictor = 1; predictor <= 7; ++predictor) {
-            LosslessJpegSpec spec;
-            spec.components = components;
-            spec.predictor = predictor;
-            spec.pointTransform = predictor % 3;
-            spec.restartRows = predictor % 2 ? 4 : 0;
-            const Bytes stream = EncodeLosslessJpeg(TestPattern(16, 16, components, unsigned(predictor)), spec);
+            LosslessJpegSpec plan;
+            plan.components = components;
+            plan.predictor = predictor;
+            plan.pointTransform = predictor % 3;
+            plan.restartRows = predictor % 2 ? 4 : 0;
+            const Bytes stream = EncodeLosslessJpeg(TestPattern(16, 16, components, unsigned(predictor)), plan);
             seeds.Write("jpeg", "lossless" + std::to_string(components) + "_" + std::to_string(predictor),
                         Prefix({uint32_t(components == 3), 0, 15, 15, 1, 0}, {1, 1, 2, 2, 1, 1}) +
                             AsString(BuildNitfJpegData({stream}, NitfApp6Spec{})));

@@ -71,13 +71,13 @@ int main(int argc, char** argv)
 {
     const char* path = argc > 1 ? argv[1] : "samples/sample_cadrg.ntf";
     try {
-        RpfFrameSpec spec;
-        spec.indexImage = MapPicture();
-        spec.corners.northWestLatitude = spec.corners.northEastLatitude = 36.0;
-        spec.corners.southWestLatitude = spec.corners.southEastLatitude = 35.5;
-        spec.corners.northWestLongitude = spec.corners.southWestLongitude = -76.0;
-        spec.corners.northEastLongitude = spec.corners.southEastLongitude = -75.5;
-        WriteFile(path, BuildRpfFrame(spec).bytes);
+        RpfFrameSpec plan;
+        plan.indexImage = MapPicture();
+        plan.corners.northWestLatitude = plan.corners.northEastLatitude = 36.0;
+        plan.corners.southWestLatitude = plan.corners.southEastLatitude = 35.5;
+        plan.corners.northWestLongitude = plan.corners.southWestLongitude = -76.0;
+        plan.corners.northEastLongitude = plan.corners.southEastLongitude = -75.5;
+        WriteFile(path, BuildRpfFrame(plan).bytes);
     } catch (const std::exception& failure) {
         std::fprintf(stderr, "samplegen: %s\n", failure.what());
         return 1;

@@ -168,7 +168,7 @@ bool ReadFrame(const uint8_t* segment, size_t length, const LOADFILEOPTION& opti
         (frame.componentCount != 1 && frame.componentCount != kMaxComponents) ||
         length != 6 + 3 * size_t(frame.componentCount))
         return false;
-    // Each component specification is three bytes: identifier, sampling
+    // Each component is described in three bytes: identifier, sampling
     // factors, quantisation table. The count is 1 or 3 here.
     for (unsigned c = 0; c < frame.componentCount; ++c) {
         if (segment[7 + 3 * c] != kUnsubsampled)

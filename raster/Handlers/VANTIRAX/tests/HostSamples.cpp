@@ -29,37 +29,37 @@ std::string DegreeSlot(double latitude, double longitude)
     return slot;
 }
 
-std::string ImageFile(const NitfImageSpec& spec)
+std::string ImageFile(const NitfImageSpec& plan)
 {
-    return BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, Pattern)));
+    return BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, Pattern)));
 }
 
 NitfImageSpec UtmRgbSpec()
 {
-    NitfImageSpec spec;
-    spec.rows = kUtmRows;
-    spec.columns = kUtmColumns;
-    spec.IREP = "RGB";
-    spec.bands = {NitfBandSpec{"R", 0, 0, ""}, NitfBandSpec{"G", 0, 0, ""}, NitfBandSpec{"B", 0, 0, ""}};
-    spec.IMODE = 'P';
-    spec.ICORDS = 'N';
+    NitfImageSpec plan;
+    plan.rows = kUtmRows;
+    plan.columns = kUtmColumns;
+    plan.IREP = "RGB";
+    plan.bands = {NitfBandSpec{"R", 0, 0, ""}, NitfBandSpec{"G", 0, 0, ""}, NitfBandSpec{"B", 0, 0, ""}};
+    plan.IMODE = 'P';
+    plan.ICORDS = 'N';
     const double east = kUtmWest + kUtmColumns * kUtmPixel;
     const double south = kUtmNorth - kUtmRows * kUtmPixel;
-    spec.IGEOLO = UtmSlot(kUtmWest, kUtmNorth) + UtmSlot(east, kUtmNorth) + UtmSlot(east, south) +
+    plan.IGEOLO = UtmSlot(kUtmWest, kUtmNorth) + UtmSlot(east, kUtmNorth) + UtmSlot(east, south) +
                   UtmSlot(kUtmWest, south);
-    return spec;
+    return plan;
 }
 
 } // namespace
 
 std::string FrameFile(const RpfCorners& corners, RpfProduct product, const std::set<uint32_t>& maskedSubframes)
 {
-    RpfFrameSpec spec;
-    spec.product = product;
-    spec.indexImage = PatternIndexImage();
-    spec.corners = corners;
-    spec.maskedSubframes = maskedSubframes;
-    return BuildRpfFrame(spec).bytes;
+    RpfFrameSpec plan;
+    plan.product = product;
+    plan.indexImage = PatternIndexImage();
+    plan.corners = corners;
+    plan.maskedSubframes = maskedSubframes;
+    return BuildRpfFrame(plan).bytes;
 }
 
 std::string SmallFrameFile(const RpfCorners& corners)
@@ -77,19 +77,19 @@ std::string UtmRgbImage()
 
 std::string RotatedGreyImage()
 {
-    NitfImageSpec spec;
-    spec.rows = kGreyRows;
-    spec.columns = kGreyColumns;
-    spec.ICORDS = 'D';
-    spec.IGEOLO = DegreeSlot(45.0, 10.0) + DegreeSlot(45.1, 10.2) + DegreeSlot(45.05, 10.25) +
+    NitfImageSpec plan;
+    plan.rows = kGreyRows;
+    plan.columns = kGreyColumns;
+    plan.ICORDS = 'D';
+    plan.IGEOLO = DegreeSlot(45.0, 10.0) + DegreeSlot(45.1, 10.2) + DegreeSlot(45.05, 10.25) +
                   DegreeSlot(44.95, 10.05);
-    return ImageFile(spec);
+    return ImageFile(plan);
 }
 
 std::string BrokenFrame()
 {
-    NitfFileSpec spec;
-    spec.images.push_back({std::string(100, 'x'), std::string(100, 'y')});
-    spec.userHeaderData = Tre("RPFHDR", std::string(48, '\0'));
-    return BuildNitfFile(spec);
+    NitfFileSpec plan;
+    plan.images.push_back({std::string(100, 'x'), std::string(100, 'y')});
+    plan.userHeaderData = Tre("RPFHDR", std::string(48, '\0'));
+    return BuildNitfFile(plan);
 }

@@ -34,29 +34,29 @@ TEST(MemoryLimits, BiLevelImageLargerThanTheBitmapCapIsNotDecoded)
 {
     // 99,999,999 x 100 one-bit pixels: about 1.16 GiB, above the 1 GiB cap.
     constexpr uint32_t kColumns = 99999999, kRows = 100;
-    NitfImageSpec spec;
-    spec.columns = int32_t(kColumns);
-    spec.rows = int32_t(kRows);
-    spec.NBPP = 1;
-    spec.IC = "C1";
-    spec.COMRAT = "1D  ";
+    NitfImageSpec plan;
+    plan.columns = int32_t(kColumns);
+    plan.rows = int32_t(kRows);
+    plan.NBPP = 1;
+    plan.IC = "C1";
+    plan.COMRAT = "1D  ";
     const std::vector<uint8_t> strip = EncodeT4Strip(std::vector<uint8_t>(8 * kRows, 0), 64, kRows, false);
-    ExpectOpensSmallAndRowsFail(BuildImageFile(spec, std::string(strip.begin(), strip.end())), kColumns);
+    ExpectOpensSmallAndRowsFail(BuildImageFile(plan, std::string(strip.begin(), strip.end())), kColumns);
 }
 
 // A white bi-level image of the given width, two rows, coded two-dimensionally.
 std::string WideBiLevelFile(uint32_t columns)
 {
     constexpr uint32_t kRows = 2;
-    NitfImageSpec spec;
-    spec.columns = int32_t(columns);
-    spec.rows = int32_t(kRows);
-    spec.NBPP = 1;
-    spec.IC = "C1";
-    spec.COMRAT = "2DS ";
+    NitfImageSpec plan;
+    plan.columns = int32_t(columns);
+    plan.rows = int32_t(kRows);
+    plan.NBPP = 1;
+    plan.IC = "C1";
+    plan.COMRAT = "2DS ";
     const std::vector<uint8_t> white(size_t((columns + 7) / 8) * kRows, 0);
     const std::vector<uint8_t> strip = EncodeT4Strip(white, columns, kRows, true);
-    return BuildImageFile(spec, std::string(strip.begin(), strip.end()));
+    return BuildImageFile(plan, std::string(strip.begin(), strip.end()));
 }
 
 TEST(MemoryLimits, BiLevelImageWhoseDecoderWouldNeedOverAQuarterGibibyteIsNotDecoded)
@@ -80,12 +80,12 @@ std::string JpegImageFile(uint32_t streamSide)
     JpegBlockSpec block;
     block.width = block.height = streamSide;
     const Bytes stream = EncodeJpegBlock(Bytes(size_t(streamSide) * streamSide, 0x80), block);
-    NitfImageSpec spec;
-    spec.columns = spec.rows = 16;
-    spec.IC = "C3";
-    spec.COMRAT = "00.0";
+    NitfImageSpec plan;
+    plan.columns = plan.rows = 16;
+    plan.IC = "C3";
+    plan.COMRAT = "00.0";
     const Bytes data = BuildNitfJpegData({stream}, NitfApp6Spec{});
-    return BuildImageFile(spec, std::string(data.begin(), data.end()));
+    return BuildImageFile(plan, std::string(data.begin(), data.end()));
 }
 
 TEST(MemoryLimits, JpegStreamLargerThanItsBlockIsNotDecoded)

@@ -33,13 +33,13 @@ std::string AsString(const std::vector<uint8_t>& bytes)
 
 NitfImageSpec BlockedImage(const std::string& IREP, int32_t bands, int32_t side, int32_t blockSide)
 {
-    NitfImageSpec spec;
-    spec.rows = spec.columns = side;
-    spec.NPPBH = spec.NPPBV = blockSide;
-    spec.NBPR = spec.NBPC = (side + blockSide - 1) / blockSide;
-    spec.IREP = IREP;
-    spec.bands.assign(size_t(bands), NitfBandSpec{});
-    return spec;
+    NitfImageSpec plan;
+    plan.rows = plan.columns = side;
+    plan.NPPBH = plan.NPPBV = blockSide;
+    plan.NBPR = plan.NBPC = (side + blockSide - 1) / blockSide;
+    plan.IREP = IREP;
+    plan.bands.assign(size_t(bands), NitfBandSpec{});
+    return plan;
 }
 
 std::string JpegFile(unsigned seed)
@@ -47,10 +47,10 @@ std::string JpegFile(unsigned seed)
     std::vector<Bytes> blocks;
     for (unsigned block = 0; block < 4; ++block)
         blocks.push_back(EncodeJpegBlock(TestPattern(kJpegBlockSide, kJpegBlockSide, 1, seed * 4 + block), {}));
-    NitfImageSpec spec = BlockedImage("MONO", 1, 2 * kJpegBlockSide, kJpegBlockSide);
-    spec.IC = "C3";
-    spec.COMRAT = "00.0";
-    return BuildImageFile(spec, AsString(BuildNitfJpegData(blocks, NitfApp6Spec{2, 2, 0, 0})));
+    NitfImageSpec plan = BlockedImage("MONO", 1, 2 * kJpegBlockSide, kJpegBlockSide);
+    plan.IC = "C3";
+    plan.COMRAT = "00.0";
+    return BuildImageFile(plan, AsString(BuildNitfJpegData(blocks, NitfApp6Spec{2, 2, 0, 0})));
 }
 
 std::string BiLevelFile(unsigned seed)
@@ -58,36 +58,36 @@ std::string BiLevelFile(unsigned seed)
     std::vector<uint8_t> packed(size_t(kBiLevelWidth / 8) * kBiLevelHeight);
     for (size_t i = 0; i < packed.size(); ++i)
         packed[i] = static_cast<uint8_t>((i * 37 + seed * 11) ^ (i / 12));
-    NitfImageSpec spec; // one block of the image's size, MONO
-    spec.columns = int32_t(kBiLevelWidth);
-    spec.rows = int32_t(kBiLevelHeight);
-    spec.NBPP = 1;
-    spec.IC = "C1";
-    spec.COMRAT = seed % 2 ? "2DS " : "1D  ";
-    return BuildImageFile(spec, AsString(EncodeT4Strip(packed, kBiLevelWidth, kBiLevelHeight, seed % 2 == 1)));
+    NitfImageSpec plan; // one block of the image's size, MONO
+    plan.columns = int32_t(kBiLevelWidth);
+    plan.rows = int32_t(kBiLevelHeight);
+    plan.NBPP = 1;
+    plan.IC = "C1";
+    plan.COMRAT = seed % 2 ? "2DS " : "1D  ";
+    return BuildImageFile(plan, AsString(EncodeT4Strip(packed, kBiLevelWidth, kBiLevelHeight, seed % 2 == 1)));
 }
 
 std::string RpfFile(unsigned seed)
 {
-    RpfFrameSpec spec;
-    spec.product = seed % 2 ? RpfProduct::Cib : RpfProduct::Cadrg;
-    spec.bigEndian = seed % 3 != 0;
-    spec.indexImage = PatternIndexImage();
-    spec.maskedSubframes = {seed % kRpfSubframeCount};
-    return BuildRpfFrame(spec).bytes;
+    RpfFrameSpec plan;
+    plan.product = seed % 2 ? RpfProduct::Cib : RpfProduct::Cadrg;
+    plan.bigEndian = seed % 3 != 0;
+    plan.indexImage = PatternIndexImage();
+    plan.maskedSubframes = {seed % kRpfSubframeCount};
+    return BuildRpfFrame(plan).bytes;
 }
 
 std::string UncompressedFile(unsigned seed)
 {
-    NitfImageSpec spec = BlockedImage("RGB", 3, 40, 16);
-    spec.IMODE = "BPRS"[seed % 4];
-    spec.bands[0].IREPBAND = "R";
-    spec.bands[1].IREPBAND = "G";
-    spec.bands[2].IREPBAND = "B";
+    NitfImageSpec plan = BlockedImage("RGB", 3, 40, 16);
+    plan.IMODE = "BPRS"[seed % 4];
+    plan.bands[0].IREPBAND = "R";
+    plan.bands[1].IREPBAND = "G";
+    plan.bands[2].IREPBAND = "B";
     const PixelValue pixel = [seed](int32_t band, int32_t row, int32_t column) {
         return uint64_t(band * 71 + row * 13 + column * 7 + seed * 5) & 0xFF;
     };
-    return BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, pixel)));
+    return BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, pixel)));
 }
 
 void Mix(uint64_t& digest, const uint8_t* bytes, size_t count)

@@ -126,10 +126,10 @@ TEST(JpegDecode, ColourReachesTheCallerAsRgb)
 {
     Bytes pattern = TestPattern(kSide, kSide, 3, 2);
     for (bool rgbCoding : {false, true}) {
-        JpegBlockSpec spec;
-        spec.components = 3;
-        spec.rgbCoding = rgbCoding;
-        Bytes block = EncodeJpegBlock(pattern, spec);
+        JpegBlockSpec plan;
+        plan.components = 3;
+        plan.rgbCoding = rgbCoding;
+        Bytes block = EncodeJpegBlock(pattern, plan);
         OpenedJpeg image(BuildNitfJpegData({block}, NitfApp6Spec {1, 1, 0, uint8_t(rgbCoding ? 1 : 2)}), 1, 3);
         ASSERT_TRUE(image.opened);
         EXPECT_EQ(image.decoder.loaderConverted, 1);
@@ -245,12 +245,12 @@ TEST(LosslessJpeg, EveryPredictorRestoresTheSamples)
     Bytes colour = TestPattern(kSide, kSide, 3, 9);
     for (int predictor = 1; predictor <= 7; ++predictor) {
         for (int components : {1, 3}) {
-            LosslessJpegSpec spec;
-            spec.components = components;
-            spec.predictor = predictor;
-            spec.restartRows = predictor == 4 ? 4 : 0;
+            LosslessJpegSpec plan;
+            plan.components = components;
+            plan.predictor = predictor;
+            plan.restartRows = predictor == 4 ? 4 : 0;
             const Bytes& pixels = components == 1 ? grey : colour;
-            OpenedJpeg image(BuildNitfJpegData({EncodeLosslessJpeg(pixels, spec)}, {}), 1, components);
+            OpenedJpeg image(BuildNitfJpegData({EncodeLosslessJpeg(pixels, plan)}, {}), 1, components);
             ASSERT_TRUE(image.opened) << predictor << " " << components;
             EXPECT_EQ(image.Block(0, components), pixels) << predictor << " " << components;
         }
@@ -260,10 +260,10 @@ TEST(LosslessJpeg, EveryPredictorRestoresTheSamples)
 TEST(LosslessJpeg, PointTransformDropsTheLowBits)
 {
     Bytes pixels = TestPattern(kSide, kSide, 1, 10);
-    LosslessJpegSpec spec;
-    spec.predictor = 6;
-    spec.pointTransform = 2;
-    OpenedJpeg image(BuildNitfJpegData({EncodeLosslessJpeg(pixels, spec)}, {}), 1);
+    LosslessJpegSpec plan;
+    plan.predictor = 6;
+    plan.pointTransform = 2;
+    OpenedJpeg image(BuildNitfJpegData({EncodeLosslessJpeg(pixels, plan)}, {}), 1);
     ASSERT_TRUE(image.opened);
     for (uint8_t& value : pixels)
         value &= 0xFC;

@@ -14,28 +14,28 @@ uint64_t Ramp(int32_t band, int32_t row, int32_t column)
     return uint64_t(band * 100 + row * 7 + column) & 0xFF;
 }
 
-std::string FileOf(const NitfImageSpec& spec, bool fileDowngradeEvent = false)
+std::string FileOf(const NitfImageSpec& plan, bool fileDowngradeEvent = false)
 {
-    return BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, Ramp)), fileDowngradeEvent);
+    return BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, Ramp)), fileDowngradeEvent);
 }
 
 TEST(ImageSubheader, ReadsEveryFieldGroupOfANitf21Subheader)
 {
-    NitfImageSpec spec;
-    spec.rows = 5;
-    spec.columns = 7;
-    spec.ICORDS = 'G';
-    spec.IGEOLO = kGeographicCorners;
-    spec.comments = {"first comment", "second comment"};
-    spec.IREP = "rgb/lut";
-    spec.bands = {NitfBandSpec{"LU", 3, 4, RgbLookupTables(4)}};
-    spec.NPPBH = 4;
-    spec.NPPBV = 3;
-    spec.NBPR = 2;
-    spec.NBPC = 2;
-    spec.UDID = "user data";
-    spec.IXSHD = "extended";
-    LoadedImage loaded(FileOf(spec));
+    NitfImageSpec plan;
+    plan.rows = 5;
+    plan.columns = 7;
+    plan.ICORDS = 'G';
+    plan.IGEOLO = kGeographicCorners;
+    plan.comments = {"first comment", "second comment"};
+    plan.IREP = "rgb/lut";
+    plan.bands = {NitfBandSpec{"LU", 3, 4, RgbLookupTables(4)}};
+    plan.NPPBH = 4;
+    plan.NPPBV = 3;
+    plan.NBPR = 2;
+    plan.NBPC = 2;
+    plan.UDID = "user data";
+    plan.IXSHD = "extended";
+    LoadedImage loaded(FileOf(plan));
     ASSERT_TRUE(loaded.Parse());
     const CNitfImage& image = loaded.image;
     EXPECT_EQ(image.NROWS, 5);
@@ -61,15 +61,15 @@ TEST(ImageSubheader, ReadsEveryFieldGroupOfANitf21Subheader)
 
 TEST(ImageSubheader, CornerFormNDependsOnTheVersion)
 {
-    NitfImageSpec spec;
-    spec.ICORDS = 'N';
-    spec.IGEOLO = std::string(60, '1');
-    LoadedImage nitf21(FileOf(spec));
+    NitfImageSpec plan;
+    plan.ICORDS = 'N';
+    plan.IGEOLO = std::string(60, '1');
+    LoadedImage nitf21(FileOf(plan));
     ASSERT_TRUE(nitf21.Parse());
     EXPECT_NE(nitf21.image.IGEOLO, nullptr);
 
-    spec.version21 = false; // "N" means no corners in NITF 2.0: no IGEOLO follows
-    LoadedImage nitf20(FileOf(spec));
+    plan.version21 = false; // "N" means no corners in NITF 2.0: no IGEOLO follows
+    LoadedImage nitf20(FileOf(plan));
     ASSERT_TRUE(nitf20.Open());
     EXPECT_EQ(nitf20.image.ICORDS(), ' ');
     EXPECT_EQ(nitf20.image.IGEOLO, nullptr);
@@ -79,13 +79,13 @@ TEST(ImageSubheader, CornerFormNDependsOnTheVersion)
 // ISDWNG 999998 carries ISDEVT whether or not the file header has a downgrade event.
 TEST(ImageSubheader, Nitf20DowngradeEventInEitherHeaderLayout)
 {
-    NitfImageSpec spec;
-    spec.version21 = false;
-    spec.downgradeEvent = true;
-    spec.rows = 3;
-    spec.columns = 4;
+    NitfImageSpec plan;
+    plan.version21 = false;
+    plan.downgradeEvent = true;
+    plan.rows = 3;
+    plan.columns = 4;
     for (bool fileEvent : {true, false}) {
-        LoadedImage loaded(FileOf(spec, fileEvent));
+        LoadedImage loaded(FileOf(plan, fileEvent));
         ASSERT_TRUE(loaded.Open()) << fileEvent;
         EXPECT_EQ(loaded.header.fixedLayout, fileEvent ? 0 : 1);
         EXPECT_EQ(loaded.image.NROWS, 3);
@@ -96,20 +96,20 @@ TEST(ImageSubheader, Nitf20DowngradeEventInEitherHeaderLayout)
 
 TEST(ImageSubheader, CompressionCodes)
 {
-    NitfImageSpec spec;
-    spec.IC = "C5";
-    spec.COMRAT = "2.50";
-    LoadedImage lossless(FileOf(spec));
+    NitfImageSpec plan;
+    plan.IC = "C5";
+    plan.COMRAT = "2.50";
+    LoadedImage lossless(FileOf(plan));
     ASSERT_TRUE(lossless.Parse());
     EXPECT_EQ(lossless.image.compressionKind, kLosslessJpeg);
     EXPECT_DOUBLE_EQ(lossless.image.comrat, 2.5);
 
-    spec.IC = "C8";
-    LoadedImage jpeg2000(FileOf(spec));
+    plan.IC = "C8";
+    LoadedImage jpeg2000(FileOf(plan));
     EXPECT_FALSE(jpeg2000.Parse());
 
-    spec.IC = "C2"; // parses, never served
-    LoadedImage arithmetic(FileOf(spec));
+    plan.IC = "C2"; // parses, never served
+    LoadedImage arithmetic(FileOf(plan));
     ASSERT_TRUE(arithmetic.Parse());
     EXPECT_EQ(arithmetic.image.compressionKind, kArithmeticDpcm);
     EXPECT_FALSE(arithmetic.image.PrepareData(arithmetic.reader, 1));
@@ -118,10 +118,10 @@ TEST(ImageSubheader, CompressionCodes)
 // Writers pad the subheader past its last field; pixels start at HL + LISH.
 TEST(ImageSubheader, ImageDataStartsAfterTheDeclaredSubheaderLength)
 {
-    NitfImageSpec spec;
-    spec.columns = 6;
-    spec.padding = "PAD";
-    LoadedImage loaded(FileOf(spec));
+    NitfImageSpec plan;
+    plan.columns = 6;
+    plan.padding = "PAD";
+    LoadedImage loaded(FileOf(plan));
     ASSERT_TRUE(loaded.Open());
     const std::vector<uint8_t> row = loaded.Row(0);
     for (int32_t c = 0; c < 6; ++c)
@@ -130,17 +130,17 @@ TEST(ImageSubheader, ImageDataStartsAfterTheDeclaredSubheaderLength)
 
 TEST(ImageSubheader, RefusesCountsAndLengthsBeyondTheFile)
 {
-    NitfImageSpec spec;
-    std::string file = FileOf(spec);
+    NitfImageSpec plan;
+    std::string file = FileOf(plan);
     // NBANDS "0" with XBANDS 99999: far more band records than the file holds.
-    NitfImageSpec extended = spec;
+    NitfImageSpec extended = plan;
     extended.extendedBandCount = true;
     std::string bytes = BuildImageFile(extended, "x");
     bytes.replace(bytes.find("NC000001"), 8, "NC099999");
     LoadedImage manyBands(bytes);
     EXPECT_FALSE(manyBands.Parse());
     // A lookup table longer than the rest of the file.
-    NitfImageSpec lut = spec;
+    NitfImageSpec lut = plan;
     lut.IREP = "RGB/LUT";
     lut.bands = {NitfBandSpec{"LU", 3, 4, RgbLookupTables(4)}};
     bytes = BuildImageFile(lut, "x");

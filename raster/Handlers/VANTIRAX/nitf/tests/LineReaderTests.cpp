@@ -13,17 +13,17 @@ uint64_t Ramp(int32_t band, int32_t row, int32_t column)
 // A 3-band RGB image of 7 x 5 in 2 x 2 blocks of 4 x 3: padded edge blocks.
 NitfImageSpec BlockedRgb(char IMODE)
 {
-    NitfImageSpec spec;
-    spec.rows = 5;
-    spec.columns = 7;
-    spec.IREP = "RGB";
-    spec.bands = {NitfBandSpec{"R", 0, 0, ""}, NitfBandSpec{"G", 0, 0, ""}, NitfBandSpec{"B", 0, 0, ""}};
-    spec.IMODE = IMODE;
-    spec.NBPR = 2;
-    spec.NBPC = 2;
-    spec.NPPBH = 4;
-    spec.NPPBV = 3;
-    return spec;
+    NitfImageSpec plan;
+    plan.rows = 5;
+    plan.columns = 7;
+    plan.IREP = "RGB";
+    plan.bands = {NitfBandSpec{"R", 0, 0, ""}, NitfBandSpec{"G", 0, 0, ""}, NitfBandSpec{"B", 0, 0, ""}};
+    plan.IMODE = IMODE;
+    plan.NBPR = 2;
+    plan.NBPC = 2;
+    plan.NPPBH = 4;
+    plan.NPPBV = 3;
+    return plan;
 }
 
 std::vector<uint8_t> ExpectedRgbRow(int32_t row, int32_t first, int32_t last)
@@ -45,10 +45,10 @@ std::vector<uint8_t> Head(std::vector<uint8_t> row, size_t count)
 TEST(LineReader, EveryImodeGivesTheSameRowsAcrossPaddedBlocks)
 {
     for (char IMODE : {'B', 'P', 'R', 'S'}) {
-        const NitfImageSpec spec = BlockedRgb(IMODE);
-        LoadedImage loaded(BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, Ramp))));
+        const NitfImageSpec plan = BlockedRgb(IMODE);
+        LoadedImage loaded(BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, Ramp))));
         ASSERT_TRUE(loaded.Open()) << IMODE;
-        for (int32_t row = 0; row < spec.rows; ++row)
+        for (int32_t row = 0; row < plan.rows; ++row)
             EXPECT_EQ(Head(loaded.Row(uint32_t(row)), 21), ExpectedRgbRow(row, 0, 6)) << IMODE << row;
         // A span from the middle of one block to the middle of the next.
         EXPECT_EQ(Head(loaded.Row(4, 2, 5), 12), ExpectedRgbRow(4, 2, 5)) << IMODE;
@@ -58,8 +58,8 @@ TEST(LineReader, EveryImodeGivesTheSameRowsAcrossPaddedBlocks)
 // A row costs about its own bytes: the scratch buffer holds one block row, not a block.
 TEST(LineReader, ScratchBufferHoldsOneRowOfABlock)
 {
-    NitfImageSpec spec = BlockedRgb('B');
-    LoadedImage loaded(BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, Ramp))));
+    NitfImageSpec plan = BlockedRgb('B');
+    LoadedImage loaded(BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, Ramp))));
     ASSERT_TRUE(loaded.Open());
     EXPECT_EQ(loaded.image.lineBuffer.size(), 3u * 4u);
 }
@@ -67,12 +67,12 @@ TEST(LineReader, ScratchBufferHoldsOneRowOfABlock)
 TEST(LineReader, MaskedBlocksThatAreNotStoredComeOutAsZeros)
 {
     for (char IMODE : {'B', 'P', 'S'}) {
-        NitfImageSpec spec = BlockedRgb(IMODE);
-        spec.IC = "NM";
-        const std::vector<std::string> blocks = BuildImageBlocks(spec, Ramp);
+        NitfImageSpec plan = BlockedRgb(IMODE);
+        plan.IC = "NM";
+        const std::vector<std::string> blocks = BuildImageBlocks(plan, Ramp);
         std::vector<bool> stored(blocks.size(), true);
         stored[1] = false; // block 1 (of band 0 in IMODE "S")
-        LoadedImage loaded(BuildImageFile(spec, BuildMaskedData(blocks, stored, 8)));
+        LoadedImage loaded(BuildImageFile(plan, BuildMaskedData(blocks, stored, 8)));
         ASSERT_TRUE(loaded.Open()) << IMODE;
         EXPECT_TRUE(loaded.image.isMasked);
         std::vector<uint8_t> expected = ExpectedRgbRow(0, 0, 6);
@@ -86,37 +86,37 @@ TEST(LineReader, MaskedBlocksThatAreNotStoredComeOutAsZeros)
 
 TEST(LineReader, WideMonochromeKeepsTheTopSignificantBits)
 {
-    NitfImageSpec spec;
-    spec.columns = 3;
-    spec.NBPP = 16;
-    spec.ABPP = 11;
+    NitfImageSpec plan;
+    plan.columns = 3;
+    plan.NBPP = 16;
+    plan.ABPP = 11;
     const uint64_t values[] = {0x07FF, 0x0400, 0x0008};
     auto pixel = [&](int32_t, int32_t, int32_t column) { return values[column]; };
-    LoadedImage right(BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, pixel))));
+    LoadedImage right(BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, pixel))));
     ASSERT_TRUE(right.Open());
     EXPECT_EQ(Head(right.Row(0), 3), (std::vector<uint8_t>{0xFF, 0x80, 0x01}));
 
-    spec.PJUST = 'L'; // the significant bits stand at the top of the pixel
-    LoadedImage left(BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, pixel))));
+    plan.PJUST = 'L'; // the significant bits stand at the top of the pixel
+    LoadedImage left(BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, pixel))));
     ASSERT_TRUE(left.Open());
     EXPECT_EQ(Head(left.Row(0), 3), (std::vector<uint8_t>{0x07, 0x04, 0x00}));
 
-    spec.PJUST = 'R';
-    spec.NBPP = 32;
-    spec.ABPP = 20; // more than 8 bits below the two top bytes
+    plan.PJUST = 'R';
+    plan.NBPP = 32;
+    plan.ABPP = 20; // more than 8 bits below the two top bytes
     const uint64_t wide[] = {0xFFFFF, 0x80000, 0x00FFF};
     auto widePixel = [&](int32_t, int32_t, int32_t column) { return wide[column]; };
-    LoadedImage bits20(BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, widePixel))));
+    LoadedImage bits20(BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, widePixel))));
     ASSERT_TRUE(bits20.Open());
     EXPECT_EQ(Head(bits20.Row(0), 3), (std::vector<uint8_t>{0xFF, 0x80, 0x00}));
 }
 
 TEST(LineReader, Palettes)
 {
-    NitfImageSpec spec;
-    spec.IREP = "RGB/LUT";
-    spec.bands = {NitfBandSpec{"LU", 3, 200, RgbLookupTables(200)}};
-    LoadedImage lut(BuildImageFile(spec, "\x05"));
+    NitfImageSpec plan;
+    plan.IREP = "RGB/LUT";
+    plan.bands = {NitfBandSpec{"LU", 3, 200, RgbLookupTables(200)}};
+    LoadedImage lut(BuildImageFile(plan, "\x05"));
     ASSERT_TRUE(lut.Open());
     EXPECT_EQ(lut.image.GetPaletteSize(), 200);
     uint8_t red = 0, green = 0, blue = 0;
@@ -146,8 +146,8 @@ TEST(LineReader, Palettes)
 
 TEST(LineReader, RefusesRowsAndSpansOutsideTheImage)
 {
-    const NitfImageSpec spec = BlockedRgb('P');
-    LoadedImage loaded(BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, Ramp))));
+    const NitfImageSpec plan = BlockedRgb('P');
+    LoadedImage loaded(BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, Ramp))));
     ASSERT_TRUE(loaded.Open());
     std::vector<uint8_t> out(64, 0xEE);
     EXPECT_FALSE(loaded.image.ReadLine(loaded.reader, 5, 0, 6, out.data()));
@@ -162,49 +162,49 @@ TEST(LineReader, RefusesGeometriesThatDoNotFitTheFile)
 {
     const NitfImageSpec good = BlockedRgb('B');
     const std::string data = JoinBlocks(BuildImageBlocks(good, Ramp));
-    auto prepares = [&](const NitfImageSpec& spec, const std::string& bytes) {
-        LoadedImage loaded(BuildImageFile(spec, bytes));
+    auto prepares = [&](const NitfImageSpec& plan, const std::string& bytes) {
+        LoadedImage loaded(BuildImageFile(plan, bytes));
         return loaded.Parse() && loaded.image.PrepareData(loaded.reader, uint32_t(bytes.size()));
     };
     EXPECT_TRUE(prepares(good, data));
     EXPECT_FALSE(prepares(good, data.substr(0, data.size() - 1))); // short final block
 
-    NitfImageSpec spec = good;
-    spec.NPPBH = 0; // a block width of 0 with two blocks per row
-    EXPECT_FALSE(prepares(spec, data));
-    spec = good;
-    spec.NBPR = 9999; // block counts far beyond the file
-    spec.NBPC = 9999;
-    EXPECT_FALSE(prepares(spec, data));
-    spec = good;
-    spec.NBPR = 1; // blocks that do not cover the image
-    EXPECT_FALSE(prepares(spec, data));
-    spec = good;
-    spec.IMODE = 'X';
-    EXPECT_FALSE(prepares(spec, data));
-    spec = good;
-    spec.PVTYPE = "R";
-    spec.IREP = "MONO";
-    spec.NBPP = 32;
-    spec.bands.resize(1);
-    EXPECT_FALSE(prepares(spec, std::string(7 * 5 * 4, '\0'))); // floating point
+    NitfImageSpec plan = good;
+    plan.NPPBH = 0; // a block width of 0 with two blocks per row
+    EXPECT_FALSE(prepares(plan, data));
+    plan = good;
+    plan.NBPR = 9999; // block counts far beyond the file
+    plan.NBPC = 9999;
+    EXPECT_FALSE(prepares(plan, data));
+    plan = good;
+    plan.NBPR = 1; // blocks that do not cover the image
+    EXPECT_FALSE(prepares(plan, data));
+    plan = good;
+    plan.IMODE = 'X';
+    EXPECT_FALSE(prepares(plan, data));
+    plan = good;
+    plan.PVTYPE = "R";
+    plan.IREP = "MONO";
+    plan.NBPP = 32;
+    plan.bands.resize(1);
+    EXPECT_FALSE(prepares(plan, std::string(7 * 5 * 4, '\0'))); // floating point
 
-    spec = good; // a mask table with more records than the file holds
-    spec.IC = "NM";
-    spec.NBPR = 999;
-    spec.NBPC = 999;
-    LoadedImage masked(BuildImageFile(spec, BuildMaskedData(BuildImageBlocks(good, Ramp), {true, true, true, true})));
+    plan = good; // a mask table with more records than the file holds
+    plan.IC = "NM";
+    plan.NBPR = 999;
+    plan.NBPC = 999;
+    LoadedImage masked(BuildImageFile(plan, BuildMaskedData(BuildImageBlocks(good, Ramp), {true, true, true, true})));
     EXPECT_FALSE(masked.Parse());
 }
 
 TEST(LineReader, CompressedKindsWithoutDecodableDataFailTheirRows)
 {
-    NitfImageSpec spec;
-    spec.IC = "C4";
-    spec.COMRAT = "    ";
-    spec.IREP = "RGB/LUT";
-    spec.bands = {NitfBandSpec{"LU", 3, 2, RgbLookupTables(2)}};
-    LoadedImage vq(BuildImageFile(spec, std::string(16, '\0')));
+    NitfImageSpec plan;
+    plan.IC = "C4";
+    plan.COMRAT = "    ";
+    plan.IREP = "RGB/LUT";
+    plan.bands = {NitfBandSpec{"LU", 3, 2, RgbLookupTables(2)}};
+    LoadedImage vq(BuildImageFile(plan, std::string(16, '\0')));
     ASSERT_TRUE(vq.Open()); // served, as the file declares it, but no row decodes
     EXPECT_TRUE(vq.Row(0).empty());
 }

@@ -33,10 +33,10 @@ RHHandle FreshHandle()
 // sections are missing: recognised as a frame, refused by the frame reader.
 std::string BrokenFrame(const std::string& tag = "RPFHDR", size_t headerDataLength = 48)
 {
-    NitfFileSpec spec;
-    spec.images.push_back({std::string(100, 'x'), std::string(100, 'y')});
-    spec.userHeaderData = Tre(tag, std::string(headerDataLength, '\0'));
-    return BuildNitfFile(spec);
+    NitfFileSpec plan;
+    plan.images.push_back({std::string(100, 'x'), std::string(100, 'y')});
+    plan.userHeaderData = Tre(tag, std::string(headerDataLength, '\0'));
+    return BuildNitfFile(plan);
 }
 
 TEST(Exports, IdentityRecordIsCopiedWhole)

@@ -34,10 +34,10 @@ private:
 
 NitfFileSpec OneImage(bool version21)
 {
-    NitfFileSpec spec;
-    spec.version21 = version21;
-    spec.images.push_back({std::string(300, 'S'), std::string(1000, 'D')});
-    return spec;
+    NitfFileSpec plan;
+    plan.version21 = version21;
+    plan.images.push_back({std::string(300, 'S'), std::string(1000, 'D')});
+    return plan;
 }
 
 TEST(FieldNumbers, ConvertLikeAtolWithinWidth)
@@ -55,19 +55,19 @@ TEST(FieldNumbers, ConvertLikeAtolWithinWidth)
 
 TEST(NitfFileHeader, Nitf21WithEverySegmentGroup)
 {
-    NitfFileSpec spec = OneImage(true);
-    spec.images.push_back({"ab", "cdef"});
-    spec.graphics.push_back({std::string(258, 'g'), "graphic"});
-    spec.texts.push_back({std::string(282, 't'), "hello"});
-    spec.dataExtensions.push_back({std::string(200, 'd'), "des"});
-    spec.reservedExtensions.push_back({std::string(200, 'r'), "res"});
-    spec.extendedHeaderData = Tre("XTRA01", "xyz");
-    ParsedHeader file(BuildNitfFile(spec));
+    NitfFileSpec plan = OneImage(true);
+    plan.images.push_back({"ab", "cdef"});
+    plan.graphics.push_back({std::string(258, 'g'), "graphic"});
+    plan.texts.push_back({std::string(282, 't'), "hello"});
+    plan.dataExtensions.push_back({std::string(200, 'd'), "des"});
+    plan.reservedExtensions.push_back({std::string(200, 'r'), "res"});
+    plan.extendedHeaderData = Tre("XTRA01", "xyz");
+    ParsedHeader file(BuildNitfFile(plan));
     ASSERT_TRUE(file.parsed);
     const CNitfFileHeader& h = file.header;
     EXPECT_EQ(h.version21, 1);
     EXPECT_EQ(h.fixedLayout, 1);
-    EXPECT_EQ(h.HL, NitfHeaderLength(spec));
+    EXPECT_EQ(h.HL, NitfHeaderLength(plan));
     ASSERT_EQ(h.NUMI, 2);
     EXPECT_EQ(h.imageSegments[0].subheaderLength, 300u);
     EXPECT_EQ(h.imageSegments[0].dataLength, 1000u);
@@ -90,9 +90,9 @@ TEST(NitfFileHeader, Nitf21WithEverySegmentGroup)
 
 TEST(NitfFileHeader, Nitf20WithAndWithoutDowngradeEvent)
 {
-    NitfFileSpec spec = OneImage(false);
-    spec.labels.push_back({std::string(320, 'l'), "label"});
-    ParsedHeader plain(BuildNitfFile(spec));
+    NitfFileSpec plan = OneImage(false);
+    plan.labels.push_back({std::string(320, 'l'), "label"});
+    ParsedHeader plain(BuildNitfFile(plan));
     ASSERT_TRUE(plain.parsed);
     EXPECT_EQ(plain.header.version21, 0);
     EXPECT_EQ(plain.header.fixedLayout, 1);
@@ -100,32 +100,32 @@ TEST(NitfFileHeader, Nitf20WithAndWithoutDowngradeEvent)
     EXPECT_EQ(plain.header.labelSegments[0].dataLength, 5u);
     EXPECT_EQ(plain.header.graphicSegments, nullptr);
 
-    spec.downgradeEvent = true;
-    ParsedHeader downgraded(BuildNitfFile(spec));
+    plan.downgradeEvent = true;
+    ParsedHeader downgraded(BuildNitfFile(plan));
     ASSERT_TRUE(downgraded.parsed);
     EXPECT_EQ(downgraded.header.fixedLayout, 0);
-    EXPECT_EQ(downgraded.header.HL, NitfHeaderLength(spec));
+    EXPECT_EQ(downgraded.header.HL, NitfHeaderLength(plan));
     EXPECT_EQ(downgraded.header.NUML, 1);
 }
 
 TEST(NitfFileHeader, RpfHeaderRecognisedOnlyWithLength62)
 {
-    NitfFileSpec spec = OneImage(true);
-    spec.userHeaderData = RpfUserHeaderData();
-    ParsedHeader frame(BuildNitfFile(spec));
+    NitfFileSpec plan = OneImage(true);
+    plan.userHeaderData = RpfUserHeaderData();
+    ParsedHeader frame(BuildNitfFile(plan));
     ASSERT_TRUE(frame.parsed);
     EXPECT_EQ(frame.header.UDHDL, 62);
     EXPECT_TRUE(frame.header.HasRpfHeader());
     // userHeaderOffset + 14 is the first byte of the RPF header data.
-    std::string bytes = BuildNitfFile(spec);
+    std::string bytes = BuildNitfFile(plan);
     EXPECT_EQ(bytes.substr(frame.header.userHeaderOffset, 9), "000RPFHDR");
 
-    spec.userHeaderData = RpfUserHeaderData("rpfhdr");
-    ParsedHeader lowerCase(BuildNitfFile(spec));
+    plan.userHeaderData = RpfUserHeaderData("rpfhdr");
+    ParsedHeader lowerCase(BuildNitfFile(plan));
     EXPECT_TRUE(lowerCase.header.HasRpfHeader());
 
-    spec.userHeaderData = Tre("RPFHDR", std::string(kRpfHeaderDataLength + 1, '\0'));
-    ParsedHeader longer(BuildNitfFile(spec));
+    plan.userHeaderData = Tre("RPFHDR", std::string(kRpfHeaderDataLength + 1, '\0'));
+    ParsedHeader longer(BuildNitfFile(plan));
     ASSERT_TRUE(longer.parsed);
     EXPECT_EQ(longer.header.UDHDL, 63);
     EXPECT_FALSE(longer.header.HasRpfHeader());
@@ -149,20 +149,20 @@ TEST(NitfFileHeader, RefusesWrongVersionsAndLengths)
 
 TEST(NitfFileHeader, RefusesLengthsThatLie)
 {
-    NitfFileSpec spec = OneImage(true);
-    spec.userHeaderData = Tre("ABCDEF", "x");
+    NitfFileSpec plan = OneImage(true);
+    plan.userHeaderData = Tre("ABCDEF", "x");
     // UDHDL of 1 or 2 would give a negative data size.
     for (int64_t lie : {1, 2}) {
-        spec.declaredUserHeaderLength = lie;
-        EXPECT_FALSE(ParsedHeader(BuildNitfFile(spec)).parsed) << lie;
+        plan.declaredUserHeaderLength = lie;
+        EXPECT_FALSE(ParsedHeader(BuildNitfFile(plan)).parsed) << lie;
     }
     // UDHDL running past the end of the file.
-    spec.declaredUserHeaderLength = 99999;
-    EXPECT_FALSE(ParsedHeader(BuildNitfFile(spec)).parsed);
-    spec.declaredUserHeaderLength = -1;
-    spec.extendedHeaderData = "x";
-    spec.declaredExtendedHeaderLength = 2;
-    EXPECT_FALSE(ParsedHeader(BuildNitfFile(spec)).parsed);
+    plan.declaredUserHeaderLength = 99999;
+    EXPECT_FALSE(ParsedHeader(BuildNitfFile(plan)).parsed);
+    plan.declaredUserHeaderLength = -1;
+    plan.extendedHeaderData = "x";
+    plan.declaredExtendedHeaderLength = 2;
+    EXPECT_FALSE(ParsedHeader(BuildNitfFile(plan)).parsed);
 
     // A segment count running past the end of the file whose FL still matches.
     std::string bytes = BuildNitfFile(OneImage(true));
@@ -176,8 +176,8 @@ TEST(NitfFileHeader, RefusesLengthsThatLie)
 
 TEST(NitfFileHeader, NoImageSegmentsStillParses)
 {
-    NitfFileSpec spec;
-    ParsedHeader file(BuildNitfFile(spec));
+    NitfFileSpec plan;
+    ParsedHeader file(BuildNitfFile(plan));
     ASSERT_TRUE(file.parsed);
     EXPECT_EQ(file.header.NUMI, 0);
     EXPECT_EQ(file.header.imageSegments, nullptr);

@@ -195,9 +195,9 @@ TEST_F(RpfBadInput, CompressionSectionChecks)
     EXPECT_FALSE(Opens(frame, [&](RpfFrame& f) { PatchRpfNumber(f, f.layout.lookupSubsection + 4, 13, 2); }));
     auto second = OpenPatched(frame, [&](RpfFrame& f) { PatchRpfNumber(f, subheader, 2, 2); });
     ASSERT_TRUE(second->opened);
-    RpfFrameSpec spec;
-    spec.maskedSubframes = {3};
-    EXPECT_EQ(DecodeWholeFrame(*second), ExpectedRpfPixels(spec));
+    RpfFrameSpec plan;
+    plan.maskedSubframes = {3};
+    EXPECT_EQ(DecodeWholeFrame(*second), ExpectedRpfPixels(plan));
     auto tableless = OpenPatched(frame, [&](RpfFrame& f) { PatchRpfNumber(f, subheader + 2, 0, 2); });
     ASSERT_TRUE(tableless->opened);
     EXPECT_FALSE(LineDecodes(*tableless, 0));

@@ -35,11 +35,11 @@ namespace {
 
 void ExpectFrameDecodes(RpfProduct product, bool bigEndian, const std::set<uint32_t>& masked)
 {
-    RpfFrameSpec spec;
-    spec.product = product;
-    spec.bigEndian = bigEndian;
-    spec.maskedSubframes = masked;
-    RpfFrame frame = BuildRpfFrame(spec);
+    RpfFrameSpec plan;
+    plan.product = product;
+    plan.bigEndian = bigEndian;
+    plan.maskedSubframes = masked;
+    RpfFrame frame = BuildRpfFrame(plan);
     auto opened = OpenFrame(frame);
     ASSERT_TRUE(opened->opened);
     CRpfFrameReader& reader = opened->reader;
@@ -52,7 +52,7 @@ void ExpectFrameDecodes(RpfProduct product, bool bigEndian, const std::set<uint3
     EXPECT_DOUBLE_EQ(reader.coverage.northEastLongitude, -99.5);
     EXPECT_DOUBLE_EQ(reader.coverage.southWestLatitude, 39.5);
     EXPECT_EQ(reader.compressionSection.lookupTables.size(), 4u);
-    EXPECT_EQ(DecodeWholeFrame(*opened), ExpectedRpfPixels(spec));
+    EXPECT_EQ(DecodeWholeFrame(*opened), ExpectedRpfPixels(plan));
 }
 
 } // namespace
@@ -69,11 +69,11 @@ TEST(RpfFrameReader, MaskedSubframesDecodeToTheMaskedPixel)
 {
     ExpectFrameDecodes(RpfProduct::Cadrg, true, {1, 14, 20, 35});
 
-    RpfFrameSpec spec;
-    spec.maskedSubframes = {1};
-    auto opened = OpenFrame(BuildRpfFrame(spec));
+    RpfFrameSpec plan;
+    plan.maskedSubframes = {1};
+    auto opened = OpenFrame(BuildRpfFrame(plan));
     ASSERT_TRUE(opened->opened);
-    std::vector<uint8_t> expected = ExpectedRpfPixels(spec);
+    std::vector<uint8_t> expected = ExpectedRpfPixels(plan);
     CRpfFrameReader& reader = opened->reader;
     reader.PrepareDraw(700);
     // A span from subframe 0 through masked subframe 1 into subframe 2.
@@ -90,10 +90,10 @@ TEST(RpfFrameReader, MaskedSubframesDecodeToTheMaskedPixel)
 
 TEST(RpfFrameReader, ServesAnyColumnSpanAndRefusesSpansOutsideTheFrame)
 {
-    RpfFrameSpec spec;
-    auto opened = OpenFrame(BuildRpfFrame(spec));
+    RpfFrameSpec plan;
+    auto opened = OpenFrame(BuildRpfFrame(plan));
     ASSERT_TRUE(opened->opened);
-    std::vector<uint8_t> expected = ExpectedRpfPixels(spec);
+    std::vector<uint8_t> expected = ExpectedRpfPixels(plan);
     CRpfFrameReader& reader = opened->reader;
     struct Span {
         uint32_t row, first, last;
@@ -175,24 +175,24 @@ TEST(RpfFrameReader, PaletteTablesOfCadrgAndCib)
 
 TEST(RpfFrameReader, TableSelectionAmongSeveralTables)
 {
-    RpfFrameSpec spec;
-    spec.colorTableRecords = {32};
-    auto single = OpenFrame(BuildRpfFrame(spec));
+    RpfFrameSpec plan;
+    plan.colorTableRecords = {32};
+    auto single = OpenFrame(BuildRpfFrame(plan));
     ASSERT_TRUE(single->opened);
     uint8_t red = 0, green = 0, blue = 0;
     EXPECT_TRUE(single->reader.colorGraySection.IsColorTable());
     EXPECT_TRUE(single->reader.colorGraySection.GetPaletteColor(31, red, green, blue));
     EXPECT_FALSE(single->reader.colorGraySection.GetPaletteColor(32, red, green, blue));
 
-    spec.colorTableRecords = {32, 16};
-    auto none = OpenFrame(BuildRpfFrame(spec));
+    plan.colorTableRecords = {32, 16};
+    auto none = OpenFrame(BuildRpfFrame(plan));
     ASSERT_TRUE(none->opened);
     EXPECT_FALSE(none->reader.colorGraySection.IsColorTable());
     EXPECT_FALSE(none->reader.colorGraySection.IsGrayTable());
     EXPECT_EQ(none->reader.colorGraySection.FindPaletteTable(), nullptr);
 
-    spec.colorTableRecords = {32, 216};
-    auto second = OpenFrame(BuildRpfFrame(spec));
+    plan.colorTableRecords = {32, 216};
+    auto second = OpenFrame(BuildRpfFrame(plan));
     ASSERT_TRUE(second->opened);
     EXPECT_EQ(second->reader.colorGraySection.FindPaletteTable(), &second->reader.colorGraySection.colorTables[1]);
 }

@@ -184,11 +184,11 @@ TEST(RpfGdalPeer, WrittenFramesDecodeAsGdalDecodesThem)
     const Case cases[] = {{RpfProduct::Cadrg, {}, {}}, {RpfProduct::Cadrg, {2, 15, 30}, southern},
                           {RpfProduct::Cib, {}, southern}, {RpfProduct::Cib, {0, 35}, {}}};
     for (const Case& frameCase : cases) {
-        RpfFrameSpec spec;
-        spec.product = frameCase.product;
-        spec.maskedSubframes = frameCase.masked;
-        spec.corners = frameCase.corners;
-        auto opened = OpenFrame(BuildRpfFrame(spec));
+        RpfFrameSpec plan;
+        plan.product = frameCase.product;
+        plan.maskedSubframes = frameCase.masked;
+        plan.corners = frameCase.corners;
+        auto opened = OpenFrame(BuildRpfFrame(plan));
         ASSERT_TRUE(opened->opened);
         GdalDecode gdal = DecodeWithGdal(opened->file->Path());
         ASSERT_EQ(gdal.indices.size(), size_t(kRpfFrameSide) * kRpfFrameSide);

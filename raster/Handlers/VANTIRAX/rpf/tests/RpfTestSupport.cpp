@@ -53,9 +53,9 @@ std::vector<uint8_t> DecodeWholeFrame(OpenedFrame& frame)
 
 RpfFrame BuildTestFrame(RpfProduct product, bool bigEndian, std::set<uint32_t> masked)
 {
-    RpfFrameSpec spec;
-    spec.product = product;
-    spec.bigEndian = bigEndian;
-    spec.maskedSubframes = std::move(masked);
-    return BuildRpfFrame(spec);
+    RpfFrameSpec plan;
+    plan.product = product;
+    plan.bigEndian = bigEndian;
+    plan.maskedSubframes = std::move(masked);
+    return BuildRpfFrame(plan);
 }

@@ -37,131 +37,131 @@ uint64_t Wide(int32_t band, int32_t row, int32_t column)
 
 NitfImageSpec Blocked(const std::string& IREP, int bands)
 {
-    NitfImageSpec spec;
-    spec.rows = kRows;
-    spec.columns = kColumns;
-    spec.IREP = IREP;
-    spec.bands.assign(bands, NitfBandSpec{});
-    spec.NBPR = (kColumns + kBlockSide - 1) / kBlockSide;
-    spec.NBPC = (kRows + kBlockSide - 1) / kBlockSide;
-    spec.NPPBH = spec.NPPBV = kBlockSide;
-    return spec;
+    NitfImageSpec plan;
+    plan.rows = kRows;
+    plan.columns = kColumns;
+    plan.IREP = IREP;
+    plan.bands.assign(bands, NitfBandSpec{});
+    plan.NBPR = (kColumns + kBlockSide - 1) / kBlockSide;
+    plan.NBPC = (kRows + kBlockSide - 1) / kBlockSide;
+    plan.NPPBH = plan.NPPBV = kBlockSide;
+    return plan;
 }
 
-std::string Uncompressed(const NitfImageSpec& spec)
+std::string Uncompressed(const NitfImageSpec& plan)
 {
-    return BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, Ramp)));
+    return BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, Ramp)));
 }
 
 std::string Frame(RpfProduct product, bool bigEndian, std::set<uint32_t> masked)
 {
-    RpfFrameSpec spec;
-    spec.product = product;
-    spec.bigEndian = bigEndian;
-    spec.indexImage = PatternIndexImage();
-    spec.maskedSubframes = std::move(masked);
-    return BuildRpfFrame(spec).bytes;
+    RpfFrameSpec plan;
+    plan.product = product;
+    plan.bigEndian = bigEndian;
+    plan.indexImage = PatternIndexImage();
+    plan.maskedSubframes = std::move(masked);
+    return BuildRpfFrame(plan).bytes;
 }
 
 std::string MonoGeographic()
 {
-    NitfImageSpec spec = Blocked("MONO", 1);
-    spec.ICORDS = 'G';
-    spec.IGEOLO = kGeographic;
-    return Uncompressed(spec);
+    NitfImageSpec plan = Blocked("MONO", 1);
+    plan.ICORDS = 'G';
+    plan.IGEOLO = kGeographic;
+    return Uncompressed(plan);
 }
 
 std::string RgbPixelInterleaved()
 {
-    NitfImageSpec spec = Blocked("RGB", 3);
-    spec.bands[0].IREPBAND = "R";
-    spec.bands[1].IREPBAND = "G";
-    spec.bands[2].IREPBAND = "B";
-    spec.IMODE = 'P';
-    spec.ICORDS = 'D';
-    spec.IGEOLO = kDecimal;
-    return Uncompressed(spec);
+    NitfImageSpec plan = Blocked("RGB", 3);
+    plan.bands[0].IREPBAND = "R";
+    plan.bands[1].IREPBAND = "G";
+    plan.bands[2].IREPBAND = "B";
+    plan.IMODE = 'P';
+    plan.ICORDS = 'D';
+    plan.IGEOLO = kDecimal;
+    return Uncompressed(plan);
 }
 
 std::string RgbBandSequential20()
 {
-    NitfImageSpec spec = Blocked("RGB", 3);
-    spec.version21 = false;
-    spec.IMODE = 'S';
-    spec.ICORDS = 'U';
-    spec.IGEOLO = kMgrs;
-    return Uncompressed(spec);
+    NitfImageSpec plan = Blocked("RGB", 3);
+    plan.version21 = false;
+    plan.IMODE = 'S';
+    plan.ICORDS = 'U';
+    plan.IGEOLO = kMgrs;
+    return Uncompressed(plan);
 }
 
 std::string RgbRowInterleavedUtm()
 {
-    NitfImageSpec spec = Blocked("RGB", 3);
-    spec.IMODE = 'R';
-    spec.ICORDS = 'N';
-    spec.IGEOLO = kUtm;
-    return Uncompressed(spec);
+    NitfImageSpec plan = Blocked("RGB", 3);
+    plan.IMODE = 'R';
+    plan.ICORDS = 'N';
+    plan.IGEOLO = kUtm;
+    return Uncompressed(plan);
 }
 
 std::string LookupTable()
 {
-    NitfImageSpec spec = Blocked("RGB/LUT", 1);
-    spec.bands[0].IREPBAND = "LU";
-    spec.bands[0].NLUTS = 3;
-    spec.bands[0].NELUT = 200;
-    spec.bands[0].LUT = RgbLookupTables(200);
-    return Uncompressed(spec);
+    NitfImageSpec plan = Blocked("RGB/LUT", 1);
+    plan.bands[0].IREPBAND = "LU";
+    plan.bands[0].NLUTS = 3;
+    plan.bands[0].NELUT = 200;
+    plan.bands[0].LUT = RgbLookupTables(200);
+    return Uncompressed(plan);
 }
 
 std::string Mono16()
 {
-    NitfImageSpec spec = Blocked("MONO", 1);
-    spec.NBPP = 16;
-    spec.ABPP = 12;
-    return BuildImageFile(spec, JoinBlocks(BuildImageBlocks(spec, Wide)));
+    NitfImageSpec plan = Blocked("MONO", 1);
+    plan.NBPP = 16;
+    plan.ABPP = 12;
+    return BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, Wide)));
 }
 
 std::string MaskedBlocks()
 {
-    NitfImageSpec spec = Blocked("MONO", 1);
-    spec.IC = "NM";
-    std::vector<std::string> blocks = BuildImageBlocks(spec, Ramp);
+    NitfImageSpec plan = Blocked("MONO", 1);
+    plan.IC = "NM";
+    std::vector<std::string> blocks = BuildImageBlocks(plan, Ramp);
     std::vector<bool> stored(blocks.size(), true);
     stored[1] = false;
-    return BuildImageFile(spec, BuildMaskedData(blocks, stored, 8));
+    return BuildImageFile(plan, BuildMaskedData(blocks, stored, 8));
 }
 
 std::string Jpeg(int components)
 {
-    NitfImageSpec spec;
-    spec.rows = spec.columns = kJpegSide;
-    spec.IC = "C3";
-    spec.COMRAT = "00.0";
-    spec.IREP = components == 1 ? "MONO" : "YCbCr601";
-    spec.bands.assign(components, NitfBandSpec{});
-    spec.IMODE = components == 1 ? 'B' : 'P';
+    NitfImageSpec plan;
+    plan.rows = plan.columns = kJpegSide;
+    plan.IC = "C3";
+    plan.COMRAT = "00.0";
+    plan.IREP = components == 1 ? "MONO" : "YCbCr601";
+    plan.bands.assign(components, NitfBandSpec{});
+    plan.IMODE = components == 1 ? 'B' : 'P';
     JpegBlockSpec block;
     block.width = block.height = kJpegSide;
     block.components = components;
     NitfApp6Spec app6;
     app6.streamColor = components == 1 ? 0 : 2;
     Bytes data = BuildNitfJpegData({EncodeJpegBlock(TestPattern(kJpegSide, kJpegSide, components, 7), block)}, app6);
-    return BuildImageFile(spec, std::string(data.begin(), data.end()));
+    return BuildImageFile(plan, std::string(data.begin(), data.end()));
 }
 
 std::string BiLevel()
 {
-    NitfImageSpec spec;
-    spec.rows = kFaxHeight;
-    spec.columns = kFaxWidth;
-    spec.IC = "C1";
-    spec.COMRAT = "2D  ";
-    spec.IREP = "MONO";
-    spec.NBPP = 1;
+    NitfImageSpec plan;
+    plan.rows = kFaxHeight;
+    plan.columns = kFaxWidth;
+    plan.IC = "C1";
+    plan.COMRAT = "2D  ";
+    plan.IREP = "MONO";
+    plan.NBPP = 1;
     std::vector<uint8_t> packed((kFaxWidth + 7) / 8 * kFaxHeight);
     for (size_t i = 0; i < packed.size(); ++i)
         packed[i] = uint8_t((i * 29) ^ (i / 15));
     std::vector<uint8_t> strip = EncodeT4Strip(packed, kFaxWidth, kFaxHeight, true);
-    return BuildImageFile(spec, std::string(strip.begin(), strip.end()));
+    return BuildImageFile(plan, std::string(strip.begin(), strip.end()));
 }
 
 } // namespace
