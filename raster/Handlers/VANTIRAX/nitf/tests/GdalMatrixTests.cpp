@@ -9,6 +9,7 @@
 //    entry; the palette here has exactly NELUT entries.
 #include "geo/ImageCorners.h"
 #include "nitf/tests/NitfTestFile.h"
+#include "tests/fixtures/Command.h"
 #include "tests/fixtures/TempFiles.h"
 
 #include <gtest/gtest.h>
@@ -36,20 +37,6 @@ uint32_t SampleValue(const SourceImage& source, int32_t band, int32_t row, int32
         return uint32_t(row * 5 + column) % uint32_t(source.colours);
     const uint32_t value = uint32_t(band * 100 + row * 7 + column * 3);
     return source.wide ? (value * 13) % 2048 : value & 0xFF;
-}
-
-std::string RunCommand(const std::string& command)
-{
-    std::string output;
-    FILE* pipe = popen((command + " 2>/dev/null").c_str(), "r");
-    if (pipe == nullptr)
-        return output;
-    char chunk[4096];
-    size_t got = 0;
-    while ((got = fread(chunk, 1, sizeof chunk, pipe)) > 0)
-        output.append(chunk, got);
-    pclose(pipe);
-    return output;
 }
 
 bool HaveGdal()

@@ -8,6 +8,7 @@
 // (0, 0, 0) while this reader's palette shows it white (255, 255, 255).
 #include "rpf/tests/RpfTestSupport.h"
 
+#include "tests/fixtures/Command.h"
 #include "tests/fixtures/NitfFileWriter.h"
 
 #include <gtest/gtest.h>
@@ -30,26 +31,10 @@ struct GdalDecode {
     double corners[3][2] = {}; // upper left, upper right, lower left: (x, y)
 };
 
-std::string Run(const std::string& command, int* status = nullptr)
-{
-    std::string output;
-    FILE* pipe = popen((command + " 2>/dev/null").c_str(), "r");
-    if (pipe == nullptr)
-        return output;
-    char chunk[4096];
-    size_t got = 0;
-    while ((got = fread(chunk, 1, sizeof chunk, pipe)) > 0)
-        output.append(chunk, got);
-    int result = pclose(pipe);
-    if (status != nullptr)
-        *status = result;
-    return output;
-}
-
 bool GdalAvailable()
 {
     int status = -1;
-    Run("gdal_translate --version", &status);
+    RunCommand("gdal_translate --version", &status);
     return status == 0;
 }
 
@@ -81,7 +66,7 @@ std::vector<double> NumbersAfter(const std::string& json, const std::string& key
 GdalDecode DecodeWithGdal(const std::string& path)
 {
     GdalDecode decode;
-    std::string json = Run("gdalinfo -json '" + path + "'");
+    std::string json = RunCommand("gdalinfo -json '" + path + "'");
     std::vector<double> entries = NumbersAfter(json, "entries");
     for (size_t index = 0; index + 3 < entries.size(); index += 4)
         decode.colorTable.push_back({int(entries[index]), int(entries[index + 1]), int(entries[index + 2])});
@@ -98,7 +83,7 @@ GdalDecode DecodeWithGdal(const std::string& path)
     }
     TempFile raw("", ".raw");
     int status = -1;
-    Run("gdal_translate -q -of ENVI -b 1 '" + path + "' '" + raw.Path() + "'", &status);
+    RunCommand("gdal_translate -q -of ENVI -b 1 '" + path + "' '" + raw.Path() + "'", &status);
     std::string bytes = ReadWholeFile(raw.Path());
     std::remove((raw.Path().substr(0, raw.Path().size() - 4) + ".hdr").c_str());
     std::remove((raw.Path() + ".aux.xml").c_str());
