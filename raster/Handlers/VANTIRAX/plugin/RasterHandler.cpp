@@ -121,10 +121,13 @@ void CRasterHandler::DoStartDraw(const int32_t rect[4], uint32_t* rowWidth)
         nitfImage.ReleaseBlockCache();
 }
 
-int32_t CRasterHandler::StartDraw(RHHandle* handle, const int32_t rect[4], uint32_t* rowWidth)
+// Runs a draw step: success sets status 0; a code detaches the handler;
+// anything else is recorded as unexpected with status 5.
+template <typename Step>
+int32_t CRasterHandler::RunDrawStep(RHHandle* handle, Step step)
 {
     try {
-        DoStartDraw(rect, rowWidth);
+        step();
         handle->status = kStatusOk;
         return 1;
     } catch (long code) {
@@ -134,6 +137,11 @@ int32_t CRasterHandler::StartDraw(RHHandle* handle, const int32_t rect[4], uint3
         handle->status = kStatusFailed;
     }
     return 0;
+}
+
+int32_t CRasterHandler::StartDraw(RHHandle* handle, const int32_t rect[4], uint32_t* rowWidth)
+{
+    return RunDrawStep(handle, [&] { DoStartDraw(rect, rowWidth); });
 }
 
 int32_t CRasterHandler::GetLine(RHHandle* handle, uint32_t row, uint8_t** rowAddress, uint16_t* lineFlag)
@@ -174,17 +182,7 @@ void CRasterHandler::DoEndDraw()
 
 int32_t CRasterHandler::EndDraw(RHHandle* handle)
 {
-    try {
-        DoEndDraw();
-        handle->status = kStatusOk;
-        return 1;
-    } catch (long code) {
-        Detach(handle, code);
-    } catch (...) {
-        lastError = static_cast<int32_t>(kCodeUnexpected);
-        handle->status = kStatusFailed;
-    }
-    return 0;
+    return RunDrawStep(handle, [&] { DoEndDraw(); });
 }
 
 void CRasterHandler::DoCloseImage(RHHandle* handle)

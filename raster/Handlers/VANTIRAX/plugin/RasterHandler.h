@@ -70,6 +70,8 @@ private:
     void DoEndDraw();
     void DoCloseImage(RHHandle* handle);
     void Detach(RHHandle* handle, long code);
+    template <typename Step>
+    int32_t RunDrawStep(RHHandle* handle, Step step);
 };
 
 // Releases the palette and georeference record the open attached to a handle.
