@@ -86,14 +86,14 @@ std::vector<std::string> BlockOptions(int blockSize)
 // writes only one interleave).
 bool WriteUncompressedImage(const std::string& path, bool rgb, char imode)
 {
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.rows = plan.columns = kImageSize;
     plan.NPPBH = plan.NPPBV = kBlockSize;
     plan.NBPR = plan.NBPC = kImageSize / kBlockSize;
     plan.IMODE = imode;
     plan.IREP = rgb ? "RGB" : "MONO";
     plan.NBPP = rgb ? 8 : 16;
-    plan.bands.assign(rgb ? kRgbBands : 1, NitfBandSpec{});
+    plan.bands.assign(rgb ? kRgbBands : 1, NitfBandPlan{});
     if (rgb) {
         plan.bands[0].IREPBAND = "R";
         plan.bands[1].IREPBAND = "G";
@@ -164,7 +164,7 @@ bool WriteBiLevel(const std::string& path)
     const std::string strip = FaxStrip(path + ".tif", kBiLevelSize);
     if (strip.empty())
         return false;
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.rows = plan.columns = kBiLevelSize;
     plan.IREP = "MONO";
     plan.IC = "C1";

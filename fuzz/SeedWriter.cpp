@@ -57,9 +57,9 @@ PixelValue Pattern()
     return [](int32_t band, int32_t row, int32_t column) { return uint64_t(band * 77 + row * 13 + column * 7); };
 }
 
-NitfImageSpec Image(const std::string& IREP, int32_t bands, char IMODE)
+NitfImagePlan Image(const std::string& IREP, int32_t bands, char IMODE)
 {
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.rows = 20;
     plan.columns = 24;
     plan.NBPR = 2;
@@ -68,7 +68,7 @@ NitfImageSpec Image(const std::string& IREP, int32_t bands, char IMODE)
     plan.NPPBV = 16;
     plan.IREP = IREP;
     plan.IMODE = IMODE;
-    plan.bands.assign(size_t(bands), NitfBandSpec{});
+    plan.bands.assign(size_t(bands), NitfBandPlan{});
     if (bands == 3)
         for (int32_t band = 0; band < 3; ++band)
             plan.bands[size_t(band)].IREPBAND = std::string(1, "RGB"[band]);
@@ -78,24 +78,24 @@ NitfImageSpec Image(const std::string& IREP, int32_t bands, char IMODE)
 void UncompressedFiles(Seeds& seeds)
 {
     for (char mode : {'B', 'P', 'R', 'S'}) {
-        NitfImageSpec plan = Image("RGB", 3, mode);
+        NitfImagePlan plan = Image("RGB", 3, mode);
         seeds.Write("exports", std::string("rgb_") + mode + ".ntf",
                     BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, Pattern()))));
     }
-    NitfImageSpec lut = Image("RGB/LUT", 1, 'B');
-    lut.bands[0] = NitfBandSpec{"LU", 3, 200, RgbLookupTables(200)};
+    NitfImagePlan lut = Image("RGB/LUT", 1, 'B');
+    lut.bands[0] = NitfBandPlan{"LU", 3, 200, RgbLookupTables(200)};
     lut.ICORDS = 'G';
     lut.IGEOLO = "400000N1000000W400000N0993000W393000N0993000W393000N1000000W";
     seeds.Write("exports", "rgb_lut_geographic.ntf", BuildImageFile(lut, JoinBlocks(BuildImageBlocks(lut, Pattern()))));
 
-    NitfImageSpec mono = Image("MONO", 1, 'B');
+    NitfImagePlan mono = Image("MONO", 1, 'B');
     mono.NBPP = 16;
     mono.ABPP = 11;
     mono.ICORDS = 'U';
     mono.IGEOLO = "18SUJ2337106519" "18SUJ2347106519" "18SUJ2347106419" "18SUJ2337106419";
     seeds.Write("exports", "mono16_mgrs.ntf", BuildImageFile(mono, JoinBlocks(BuildImageBlocks(mono, Pattern()))));
 
-    NitfImageSpec masked = Image("MONO", 1, 'B');
+    NitfImagePlan masked = Image("MONO", 1, 'B');
     masked.IC = "NM";
     masked.ICORDS = 'N';
     masked.IGEOLO = "185000004500000" "185001004500000" "185001004499900" "185000004499900";
@@ -103,7 +103,7 @@ void UncompressedFiles(Seeds& seeds)
     seeds.Write("exports", "masked_utm.ntf",
                 BuildImageFile(masked, BuildMaskedData(blocks, {true, false, false, true}, 8)));
 
-    NitfImageSpec old = Image("MONO", 1, 'B');
+    NitfImagePlan old = Image("MONO", 1, 'B');
     old.version21 = false;
     old.downgradeEvent = true;
     old.comments = {"first comment", "second comment"};
@@ -115,35 +115,35 @@ void UncompressedFiles(Seeds& seeds)
 void CompressedFiles(Seeds& seeds)
 {
     const Bytes grey = TestPattern(16, 16, 1, 1);
-    JpegBlockSpec bare;
+    JpegBlockPlan bare;
     bare.defaultQuality = 3;
     bare.keepDqt = bare.keepDht = false;
     const Bytes jpeg = BuildNitfJpegData({EncodeJpegBlock(grey, {}), EncodeJpegBlock(grey, bare),
                                           EncodeJpegBlock(grey, {}), EncodeJpegBlock(grey, {})},
-                                         NitfApp6Spec{2, 2, 3, 0});
-    NitfImageSpec plan = Image("MONO", 1, 'B');
+                                         NitfApp6Plan{2, 2, 3, 0});
+    NitfImagePlan plan = Image("MONO", 1, 'B');
     plan.rows = plan.columns = 32;
     plan.IC = "C3";
     plan.COMRAT = "00.0";
     seeds.Write("exports", "jpeg_grey_2x2.ntf", BuildImageFile(plan, AsString(jpeg)));
 
-    JpegBlockSpec colour;
+    JpegBlockPlan colour;
     colour.components = 3;
-    const Bytes rgb = BuildNitfJpegData({EncodeJpegBlock(TestPattern(24, 16, 3, 2), colour)}, NitfApp6Spec{1, 1, 0, 2});
-    NitfImageSpec colourSpec = Image("RGB", 3, 'P');
-    colourSpec.rows = 16;
-    colourSpec.columns = 24;
-    colourSpec.NBPR = colourSpec.NBPC = 1;
-    colourSpec.NPPBH = colourSpec.NPPBV = 0;
-    colourSpec.IC = "C3";
-    colourSpec.COMRAT = "00.0";
-    seeds.Write("exports", "jpeg_rgb.ntf", BuildImageFile(colourSpec, AsString(rgb)));
+    const Bytes rgb = BuildNitfJpegData({EncodeJpegBlock(TestPattern(24, 16, 3, 2), colour)}, NitfApp6Plan{1, 1, 0, 2});
+    NitfImagePlan colourPlan = Image("RGB", 3, 'P');
+    colourPlan.rows = 16;
+    colourPlan.columns = 24;
+    colourPlan.NBPR = colourPlan.NBPC = 1;
+    colourPlan.NPPBH = colourPlan.NPPBV = 0;
+    colourPlan.IC = "C3";
+    colourPlan.COMRAT = "00.0";
+    seeds.Write("exports", "jpeg_rgb.ntf", BuildImageFile(colourPlan, AsString(rgb)));
 
     std::vector<uint8_t> packed(size_t(64 / 8) * 40);
     for (size_t i = 0; i < packed.size(); ++i)
         packed[i] = static_cast<uint8_t>((i * 37) ^ (i / 8));
     for (bool twoDimensional : {false, true}) {
-        NitfImageSpec bilevel = Image("MONO", 1, 'B');
+        NitfImagePlan bilevel = Image("MONO", 1, 'B');
         bilevel.rows = 40;
         bilevel.columns = 64;
         bilevel.NBPR = bilevel.NBPC = 1;
@@ -162,7 +162,7 @@ void LosslessStreams(Seeds& seeds)
 {
     for (int components : {1, 3})
         for (int predictor = 1; predictor <= 7; ++predictor) {
-            LosslessJpegSpec plan;
+            LosslessJpegPlan plan;
             plan.components = components;
             plan.predictor = predictor;
             plan.pointTransform = predictor % 3;
@@ -170,17 +170,17 @@ void LosslessStreams(Seeds& seeds)
             const Bytes stream = EncodeLosslessJpeg(TestPattern(16, 16, components, unsigned(predictor)), plan);
             seeds.Write("jpeg", "lossless" + std::to_string(components) + "_" + std::to_string(predictor),
                         Prefix({uint32_t(components == 3), 0, 15, 15, 1, 0}, {1, 1, 2, 2, 1, 1}) +
-                            AsString(BuildNitfJpegData({stream}, NitfApp6Spec{})));
+                            AsString(BuildNitfJpegData({stream}, NitfApp6Plan{})));
         }
 }
 
 void RpfFiles(Seeds& seeds)
 {
-    RpfFrameSpec cadrg;
+    RpfFramePlan cadrg;
     cadrg.indexImage = PatternIndexImage();
     cadrg.maskedSubframes = {0, 7};
     seeds.Write("exports", "cadrg_masked.on1", BuildRpfFrame(cadrg).bytes);
-    RpfFrameSpec cib;
+    RpfFramePlan cib;
     cib.product = RpfProduct::Cib;
     cib.bigEndian = false;
     cib.indexImage = PatternIndexImage();

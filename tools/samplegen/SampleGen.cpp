@@ -71,7 +71,7 @@ int main(int argc, char** argv)
 {
     const char* path = argc > 1 ? argv[1] : "samples/sample_cadrg.ntf";
     try {
-        RpfFrameSpec plan;
+        RpfFramePlan plan;
         plan.indexImage = MapPicture();
         plan.corners.northWestLatitude = plan.corners.northEastLatitude = 36.0;
         plan.corners.southWestLatitude = plan.corners.southEastLatitude = 35.5;

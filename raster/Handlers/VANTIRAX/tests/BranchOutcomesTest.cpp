@@ -25,7 +25,7 @@ std::vector<uint8_t> PaletteOf(const RHHandle& handle)
 
 TEST(RpfFrameOutcomes, CadrgFrameWithMaskedSubframes)
 {
-    RpfFrameSpec layout;
+    RpfFramePlan layout;
     layout.indexImage = PatternIndexImage();
     layout.maskedSubframes = {0, 7, 35};
     RpfFrame frame = BuildRpfFrame(layout);
@@ -73,7 +73,7 @@ TEST(RpfFrameOutcomes, CadrgFrameWithMaskedSubframes)
 
 TEST(RpfFrameOutcomes, LittleEndianCibFrameHasAGreyPalette)
 {
-    RpfFrameSpec layout;
+    RpfFramePlan layout;
     layout.product = RpfProduct::Cib;
     layout.bigEndian = false;
     layout.indexImage = PatternIndexImage();
@@ -93,7 +93,7 @@ TEST(RpfFrameOutcomes, LittleEndianCibFrameHasAGreyPalette)
 
 TEST(RpfFrameOutcomes, ShortColourTableFailsThePaletteBuild)
 {
-    RpfFrameSpec layout;
+    RpfFramePlan layout;
     layout.indexImage = std::vector<uint8_t>(kRpfFrameSide * kRpfFrameSide, 3);
     layout.colorTableRecords = {32};
     TempFile file(BuildRpfFrame(layout).bytes, ".ntf");
@@ -105,7 +105,7 @@ TEST(RpfFrameOutcomes, ShortColourTableFailsThePaletteBuild)
 
 TEST(RpfFrameOutcomes, StandInHostDumpsTheIndexImage)
 {
-    RpfFrameSpec layout;
+    RpfFramePlan layout;
     layout.indexImage = PatternIndexImage();
     layout.maskedSubframes = {14};
     TempFile file(BuildRpfFrame(layout).bytes, ".ntf");
@@ -118,7 +118,7 @@ TEST(RpfFrameOutcomes, StandInHostDumpsTheIndexImage)
 }
 
 // A plain NITF file holding one image of the given layout with a ramp of values.
-std::string PlainImage(const NitfImageSpec& layout)
+std::string PlainImage(const NitfImagePlan& layout)
 {
     PixelValue ramp = [](int32_t band, int32_t row, int32_t column) {
         return uint64_t(band * 50 + row * 3 + column) & 0xFF;
@@ -126,19 +126,19 @@ std::string PlainImage(const NitfImageSpec& layout)
     return BuildImageFile(layout, JoinBlocks(BuildImageBlocks(layout, ramp)));
 }
 
-NitfImageSpec Rgb(int32_t rows, int32_t columns)
+NitfImagePlan Rgb(int32_t rows, int32_t columns)
 {
-    NitfImageSpec layout;
+    NitfImagePlan layout;
     layout.rows = rows;
     layout.columns = columns;
     layout.IREP = "RGB";
-    layout.bands = {NitfBandSpec{"R", 0, 0, ""}, NitfBandSpec{"G", 0, 0, ""}, NitfBandSpec{"B", 0, 0, ""}};
+    layout.bands = {NitfBandPlan{"R", 0, 0, ""}, NitfBandPlan{"G", 0, 0, ""}, NitfBandPlan{"B", 0, 0, ""}};
     return layout;
 }
 
 TEST(PlainNitfOutcomes, ThreeBandRgbIsDirectWithoutPalette)
 {
-    NitfImageSpec layout = Rgb(6, 9);
+    NitfImagePlan layout = Rgb(6, 9);
     layout.IMODE = 'P';
     TempFile file(PlainImage(layout), ".ntf");
     OpenedImage image(Handler(), file.path());
@@ -155,10 +155,10 @@ TEST(PlainNitfOutcomes, ThreeBandRgbIsDirectWithoutPalette)
 
 TEST(PlainNitfOutcomes, LookupTableSizesThePalette)
 {
-    NitfImageSpec layout;
+    NitfImagePlan layout;
     layout.rows = layout.columns = 8;
     layout.IREP = "RGB/LUT";
-    layout.bands = {NitfBandSpec{"LU", 3, 200, RgbLookupTables(200)}};
+    layout.bands = {NitfBandPlan{"LU", 3, 200, RgbLookupTables(200)}};
     TempFile file(PlainImage(layout), ".ntf");
     OpenedImage image(Handler(), file.path());
     ASSERT_TRUE(image.Ready());
@@ -170,7 +170,7 @@ TEST(PlainNitfOutcomes, LookupTableSizesThePalette)
 
 TEST(PlainNitfOutcomes, SixteenBitMonoIsGreyPaletted)
 {
-    NitfImageSpec layout;
+    NitfImagePlan layout;
     layout.rows = layout.columns = 4;
     layout.NBPP = 16;
     layout.ABPP = 11;
@@ -186,7 +186,7 @@ TEST(PlainNitfOutcomes, SixteenBitMonoIsGreyPaletted)
 
 TEST(PlainNitfOutcomes, CornersGiveTheEpsgCode)
 {
-    NitfImageSpec geographic = Rgb(10, 20);
+    NitfImagePlan geographic = Rgb(10, 20);
     geographic.ICORDS = 'G';
     geographic.IGEOLO = "400000N1000000W400000N0993000W393000N0993000W393000N1000000W";
     TempFile geographicFile(PlainImage(geographic), ".ntf");
@@ -199,7 +199,7 @@ TEST(PlainNitfOutcomes, CornersGiveTheEpsgCode)
     EXPECT_DOUBLE_EQ(degrees.handle.geoRef->points[2].worldY, 39.5);
     EXPECT_DOUBLE_EQ(degrees.handle.geoRef->points[2].row, 9);
 
-    NitfImageSpec utm = Rgb(10, 20);
+    NitfImagePlan utm = Rgb(10, 20);
     utm.ICORDS = 'N';
     utm.IGEOLO = "335000004400000335010004400000335010004399000335000004399000";
     TempFile utmFile(PlainImage(utm), ".ntf");
@@ -213,7 +213,7 @@ TEST(PlainNitfOutcomes, CornersGiveTheEpsgCode)
 
 TEST(PlainNitfOutcomes, UnservedCompressionCodes)
 {
-    NitfImageSpec layout;
+    NitfImagePlan layout;
     layout.rows = layout.columns = 8;
     layout.COMRAT = "00.0";
     layout.IC = "C2"; // parses, but is never served: result 1, status 5

@@ -46,7 +46,7 @@ struct Samples {
         const StressFile uncompressed = FilesOfEveryKind(2).back();
         damagedHeader = directory / "damaged_header.ntf";
         WriteFile(damagedHeader, uncompressed.bytes.substr(0, 300));
-        NitfImageSpec real;
+        NitfImagePlan real;
         real.PVTYPE = "R";
         real.NBPP = 32;
         notServed = directory / "real_pixels.ntf";

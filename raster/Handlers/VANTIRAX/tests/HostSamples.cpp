@@ -29,18 +29,18 @@ std::string DegreeSlot(double latitude, double longitude)
     return slot;
 }
 
-std::string ImageFile(const NitfImageSpec& plan)
+std::string ImageFile(const NitfImagePlan& plan)
 {
     return BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, Pattern)));
 }
 
-NitfImageSpec UtmRgbSpec()
+NitfImagePlan UtmRgbPlan()
 {
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.rows = kUtmRows;
     plan.columns = kUtmColumns;
     plan.IREP = "RGB";
-    plan.bands = {NitfBandSpec{"R", 0, 0, ""}, NitfBandSpec{"G", 0, 0, ""}, NitfBandSpec{"B", 0, 0, ""}};
+    plan.bands = {NitfBandPlan{"R", 0, 0, ""}, NitfBandPlan{"G", 0, 0, ""}, NitfBandPlan{"B", 0, 0, ""}};
     plan.IMODE = 'P';
     plan.ICORDS = 'N';
     const double east = kUtmWest + kUtmColumns * kUtmPixel;
@@ -54,7 +54,7 @@ NitfImageSpec UtmRgbSpec()
 
 std::string FrameFile(const RpfCorners& corners, RpfProduct product, const std::set<uint32_t>& maskedSubframes)
 {
-    RpfFrameSpec plan;
+    RpfFramePlan plan;
     plan.product = product;
     plan.indexImage = PatternIndexImage();
     plan.corners = corners;
@@ -72,12 +72,12 @@ std::string SmallFrameFile(const RpfCorners& corners)
 
 std::string UtmRgbImage()
 {
-    return ImageFile(UtmRgbSpec());
+    return ImageFile(UtmRgbPlan());
 }
 
 std::string RotatedGreyImage()
 {
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.rows = kGreyRows;
     plan.columns = kGreyColumns;
     plan.ICORDS = 'D';
@@ -88,7 +88,7 @@ std::string RotatedGreyImage()
 
 std::string BrokenFrame()
 {
-    NitfFileSpec plan;
+    NitfFilePlan plan;
     plan.images.push_back({std::string(100, 'x'), std::string(100, 'y')});
     plan.userHeaderData = Tre("RPFHDR", std::string(48, '\0'));
     return BuildNitfFile(plan);

@@ -34,7 +34,7 @@ TEST(MemoryLimits, BiLevelImageLargerThanTheBitmapCapIsNotDecoded)
 {
     // 99,999,999 x 100 one-bit pixels: about 1.16 GiB, above the 1 GiB cap.
     constexpr uint32_t kColumns = 99999999, kRows = 100;
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.columns = int32_t(kColumns);
     plan.rows = int32_t(kRows);
     plan.NBPP = 1;
@@ -48,7 +48,7 @@ TEST(MemoryLimits, BiLevelImageLargerThanTheBitmapCapIsNotDecoded)
 std::string WideBiLevelFile(uint32_t columns)
 {
     constexpr uint32_t kRows = 2;
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.columns = int32_t(columns);
     plan.rows = int32_t(kRows);
     plan.NBPP = 1;
@@ -77,14 +77,14 @@ TEST(MemoryLimits, BiLevelImageWhoseDecoderWouldNeedOverAQuarterGibibyteIsNotDec
 
 std::string JpegImageFile(uint32_t streamSide)
 {
-    JpegBlockSpec block;
+    JpegBlockPlan block;
     block.width = block.height = streamSide;
     const Bytes stream = EncodeJpegBlock(Bytes(size_t(streamSide) * streamSide, 0x80), block);
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.columns = plan.rows = 16;
     plan.IC = "C3";
     plan.COMRAT = "00.0";
-    const Bytes data = BuildNitfJpegData({stream}, NitfApp6Spec{});
+    const Bytes data = BuildNitfJpegData({stream}, NitfApp6Plan{});
     return BuildImageFile(plan, std::string(data.begin(), data.end()));
 }
 

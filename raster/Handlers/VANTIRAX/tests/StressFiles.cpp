@@ -31,14 +31,14 @@ std::string AsString(const std::vector<uint8_t>& bytes)
     return std::string(bytes.begin(), bytes.end());
 }
 
-NitfImageSpec BlockedImage(const std::string& IREP, int32_t bands, int32_t side, int32_t blockSide)
+NitfImagePlan BlockedImage(const std::string& IREP, int32_t bands, int32_t side, int32_t blockSide)
 {
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.rows = plan.columns = side;
     plan.NPPBH = plan.NPPBV = blockSide;
     plan.NBPR = plan.NBPC = (side + blockSide - 1) / blockSide;
     plan.IREP = IREP;
-    plan.bands.assign(size_t(bands), NitfBandSpec{});
+    plan.bands.assign(size_t(bands), NitfBandPlan{});
     return plan;
 }
 
@@ -47,10 +47,10 @@ std::string JpegFile(unsigned seed)
     std::vector<Bytes> blocks;
     for (unsigned block = 0; block < 4; ++block)
         blocks.push_back(EncodeJpegBlock(TestPattern(kJpegBlockSide, kJpegBlockSide, 1, seed * 4 + block), {}));
-    NitfImageSpec plan = BlockedImage("MONO", 1, 2 * kJpegBlockSide, kJpegBlockSide);
+    NitfImagePlan plan = BlockedImage("MONO", 1, 2 * kJpegBlockSide, kJpegBlockSide);
     plan.IC = "C3";
     plan.COMRAT = "00.0";
-    return BuildImageFile(plan, AsString(BuildNitfJpegData(blocks, NitfApp6Spec{2, 2, 0, 0})));
+    return BuildImageFile(plan, AsString(BuildNitfJpegData(blocks, NitfApp6Plan{2, 2, 0, 0})));
 }
 
 std::string BiLevelFile(unsigned seed)
@@ -58,7 +58,7 @@ std::string BiLevelFile(unsigned seed)
     std::vector<uint8_t> packed(size_t(kBiLevelWidth / 8) * kBiLevelHeight);
     for (size_t i = 0; i < packed.size(); ++i)
         packed[i] = static_cast<uint8_t>((i * 37 + seed * 11) ^ (i / 12));
-    NitfImageSpec plan; // one block of the image's size, MONO
+    NitfImagePlan plan; // one block of the image's size, MONO
     plan.columns = int32_t(kBiLevelWidth);
     plan.rows = int32_t(kBiLevelHeight);
     plan.NBPP = 1;
@@ -69,7 +69,7 @@ std::string BiLevelFile(unsigned seed)
 
 std::string RpfFile(unsigned seed)
 {
-    RpfFrameSpec plan;
+    RpfFramePlan plan;
     plan.product = seed % 2 ? RpfProduct::Cib : RpfProduct::Cadrg;
     plan.bigEndian = seed % 3 != 0;
     plan.indexImage = PatternIndexImage();
@@ -79,7 +79,7 @@ std::string RpfFile(unsigned seed)
 
 std::string UncompressedFile(unsigned seed)
 {
-    NitfImageSpec plan = BlockedImage("RGB", 3, 40, 16);
+    NitfImagePlan plan = BlockedImage("RGB", 3, 40, 16);
     plan.IMODE = "BPRS"[seed % 4];
     plan.bands[0].IREPBAND = "R";
     plan.bands[1].IREPBAND = "G";

@@ -64,8 +64,8 @@ TEST(JpegDecode, FourSelfContainedBlocksDecodeAsLibjpegDoes)
 {
     std::vector<Bytes> blocks;
     for (unsigned i = 0; i < 4; ++i)
-        blocks.push_back(EncodeJpegBlock(TestPattern(kSide, kSide, 1, i), JpegBlockSpec {}));
-    OpenedJpeg image(BuildNitfJpegData(blocks, NitfApp6Spec {4, 1, 0, 0}), 4);
+        blocks.push_back(EncodeJpegBlock(TestPattern(kSide, kSide, 1, i), JpegBlockPlan {}));
+    OpenedJpeg image(BuildNitfJpegData(blocks, NitfApp6Plan {4, 1, 0, 0}), 4);
     ASSERT_TRUE(image.prepared);
     ASSERT_TRUE(image.opened);
     EXPECT_EQ(image.decoder.app6[12] | (image.decoder.app6[13] << 8), 4);   // blocks per row, host order
@@ -77,17 +77,17 @@ TEST(JpegDecode, FourSelfContainedBlocksDecodeAsLibjpegDoes)
 TEST(JpegDecode, MissingTablesAreTakenFromTheQualityByte)
 {
     Bytes pattern = TestPattern(kSide, kSide, 1, 7);
-    JpegBlockSpec withTables;
+    JpegBlockPlan withTables;
     withTables.defaultQuality = 3;
     Bytes complete = EncodeJpegBlock(pattern, withTables);
     Bytes expected = OpenedJpeg(BuildNitfJpegData({complete}, {}), 1).Block(0);
     EXPECT_EQ(expected, DecodeWithLibjpeg(complete, 1));
 
     for (auto [keepDqt, keepDht] : {std::pair{false, false}, {false, true}, {true, false}}) {
-        JpegBlockSpec bare = withTables;
+        JpegBlockPlan bare = withTables;
         bare.keepDqt = keepDqt;
         bare.keepDht = keepDht;
-        Bytes data = BuildNitfJpegData({EncodeJpegBlock(pattern, bare)}, NitfApp6Spec {1, 1, 3, 0});
+        Bytes data = BuildNitfJpegData({EncodeJpegBlock(pattern, bare)}, NitfApp6Plan {1, 1, 3, 0});
         OpenedJpeg image(data, 1);
         ASSERT_TRUE(image.opened) << keepDqt << keepDht;
         EXPECT_EQ(image.Block(0), expected);
@@ -101,7 +101,7 @@ TEST(JpegDecode, MissingTablesAreTakenFromTheQualityByte)
 
 TEST(JpegDecode, LastBlockWithoutEndOfImageIsDamaged)
 {
-    JpegBlockSpec open;
+    JpegBlockPlan open;
     open.keepEoi = false;
     Bytes pattern = TestPattern(kSide, kSide, 1, 1);
     Bytes data = BuildNitfJpegData({EncodeJpegBlock(pattern, {}), EncodeJpegBlock(pattern, open)}, {});
@@ -126,11 +126,11 @@ TEST(JpegDecode, ColourReachesTheCallerAsRgb)
 {
     Bytes pattern = TestPattern(kSide, kSide, 3, 2);
     for (bool rgbCoding : {false, true}) {
-        JpegBlockSpec plan;
+        JpegBlockPlan plan;
         plan.components = 3;
         plan.rgbCoding = rgbCoding;
         Bytes block = EncodeJpegBlock(pattern, plan);
-        OpenedJpeg image(BuildNitfJpegData({block}, NitfApp6Spec {1, 1, 0, uint8_t(rgbCoding ? 1 : 2)}), 1, 3);
+        OpenedJpeg image(BuildNitfJpegData({block}, NitfApp6Plan {1, 1, 0, uint8_t(rgbCoding ? 1 : 2)}), 1, 3);
         ASSERT_TRUE(image.opened);
         EXPECT_EQ(image.decoder.loaderConverted, 1);
         EXPECT_EQ(image.Block(0, 3), DecodeWithLibjpeg(block, 3)) << "R,G,B coding " << rgbCoding;
@@ -160,7 +160,7 @@ TEST(JpegDecode, HostileStreamsFailCleanly)
 {
     Bytes pattern = TestPattern(kSide, kSide, 1, 4);
     // A frame larger than the block the caller gives.
-    JpegBlockSpec large;
+    JpegBlockPlan large;
     large.width = large.height = 2 * kSide;
     Bytes big = EncodeJpegBlock(TestPattern(2 * kSide, 2 * kSide, 1, 4), large);
     EXPECT_FALSE(OpenedJpeg(BuildNitfJpegData({big}, {}), 1).opened);
@@ -245,7 +245,7 @@ TEST(LosslessJpeg, EveryPredictorRestoresTheSamples)
     Bytes colour = TestPattern(kSide, kSide, 3, 9);
     for (int predictor = 1; predictor <= 7; ++predictor) {
         for (int components : {1, 3}) {
-            LosslessJpegSpec plan;
+            LosslessJpegPlan plan;
             plan.components = components;
             plan.predictor = predictor;
             plan.restartRows = predictor == 4 ? 4 : 0;
@@ -260,7 +260,7 @@ TEST(LosslessJpeg, EveryPredictorRestoresTheSamples)
 TEST(LosslessJpeg, PointTransformDropsTheLowBits)
 {
     Bytes pixels = TestPattern(kSide, kSide, 1, 10);
-    LosslessJpegSpec plan;
+    LosslessJpegPlan plan;
     plan.predictor = 6;
     plan.pointTransform = 2;
     OpenedJpeg image(BuildNitfJpegData({EncodeLosslessJpeg(pixels, plan)}, {}), 1);
@@ -272,7 +272,7 @@ TEST(LosslessJpeg, PointTransformDropsTheLowBits)
 
 TEST(LosslessJpeg, TruncatedAndCorruptStreamsFail)
 {
-    Bytes stream = EncodeLosslessJpeg(TestPattern(kSide, kSide, 1, 11), LosslessJpegSpec {});
+    Bytes stream = EncodeLosslessJpeg(TestPattern(kSide, kSide, 1, 11), LosslessJpegPlan {});
     Bytes truncated(stream.begin(), stream.begin() + stream.size() / 2);
     truncated.insert(truncated.end(), {0xFF, 0xD9});
     EXPECT_FALSE(OpenedJpeg(BuildNitfJpegData({truncated}, {}), 1).opened);

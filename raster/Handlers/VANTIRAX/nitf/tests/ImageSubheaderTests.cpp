@@ -14,21 +14,21 @@ uint64_t Ramp(int32_t band, int32_t row, int32_t column)
     return uint64_t(band * 100 + row * 7 + column) & 0xFF;
 }
 
-std::string FileOf(const NitfImageSpec& plan, bool fileDowngradeEvent = false)
+std::string FileOf(const NitfImagePlan& plan, bool fileDowngradeEvent = false)
 {
     return BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, Ramp)), fileDowngradeEvent);
 }
 
 TEST(ImageSubheader, ReadsEveryFieldGroupOfANitf21Subheader)
 {
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.rows = 5;
     plan.columns = 7;
     plan.ICORDS = 'G';
     plan.IGEOLO = kGeographicCorners;
     plan.comments = {"first comment", "second comment"};
     plan.IREP = "rgb/lut";
-    plan.bands = {NitfBandSpec{"LU", 3, 4, RgbLookupTables(4)}};
+    plan.bands = {NitfBandPlan{"LU", 3, 4, RgbLookupTables(4)}};
     plan.NPPBH = 4;
     plan.NPPBV = 3;
     plan.NBPR = 2;
@@ -61,7 +61,7 @@ TEST(ImageSubheader, ReadsEveryFieldGroupOfANitf21Subheader)
 
 TEST(ImageSubheader, CornerFormNDependsOnTheVersion)
 {
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.ICORDS = 'N';
     plan.IGEOLO = std::string(60, '1');
     LoadedImage nitf21(FileOf(plan));
@@ -79,7 +79,7 @@ TEST(ImageSubheader, CornerFormNDependsOnTheVersion)
 // ISDWNG 999998 carries ISDEVT whether or not the file header has a downgrade event.
 TEST(ImageSubheader, Nitf20DowngradeEventInEitherHeaderLayout)
 {
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.version21 = false;
     plan.downgradeEvent = true;
     plan.rows = 3;
@@ -96,7 +96,7 @@ TEST(ImageSubheader, Nitf20DowngradeEventInEitherHeaderLayout)
 
 TEST(ImageSubheader, CompressionCodes)
 {
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.IC = "C5";
     plan.COMRAT = "2.50";
     LoadedImage lossless(FileOf(plan));
@@ -118,7 +118,7 @@ TEST(ImageSubheader, CompressionCodes)
 // Writers pad the subheader past its last field; pixels start at HL + LISH.
 TEST(ImageSubheader, ImageDataStartsAfterTheDeclaredSubheaderLength)
 {
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.columns = 6;
     plan.padding = "PAD";
     LoadedImage loaded(FileOf(plan));
@@ -130,19 +130,19 @@ TEST(ImageSubheader, ImageDataStartsAfterTheDeclaredSubheaderLength)
 
 TEST(ImageSubheader, RefusesCountsAndLengthsBeyondTheFile)
 {
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     std::string file = FileOf(plan);
     // NBANDS "0" with XBANDS 99999: far more band records than the file holds.
-    NitfImageSpec extended = plan;
+    NitfImagePlan extended = plan;
     extended.extendedBandCount = true;
     std::string bytes = BuildImageFile(extended, "x");
     bytes.replace(bytes.find("NC000001"), 8, "NC099999");
     LoadedImage manyBands(bytes);
     EXPECT_FALSE(manyBands.Parse());
     // A lookup table longer than the rest of the file.
-    NitfImageSpec lut = plan;
+    NitfImagePlan lut = plan;
     lut.IREP = "RGB/LUT";
-    lut.bands = {NitfBandSpec{"LU", 3, 4, RgbLookupTables(4)}};
+    lut.bands = {NitfBandPlan{"LU", 3, 4, RgbLookupTables(4)}};
     bytes = BuildImageFile(lut, "x");
     const std::string lutHeader = "300004";
     bytes.replace(bytes.find(lutHeader), lutHeader.size(), "399999");

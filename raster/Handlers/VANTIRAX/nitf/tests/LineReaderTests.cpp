@@ -11,13 +11,13 @@ uint64_t Ramp(int32_t band, int32_t row, int32_t column)
 }
 
 // A 3-band RGB image of 7 x 5 in 2 x 2 blocks of 4 x 3: padded edge blocks.
-NitfImageSpec BlockedRgb(char IMODE)
+NitfImagePlan BlockedRgb(char IMODE)
 {
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.rows = 5;
     plan.columns = 7;
     plan.IREP = "RGB";
-    plan.bands = {NitfBandSpec{"R", 0, 0, ""}, NitfBandSpec{"G", 0, 0, ""}, NitfBandSpec{"B", 0, 0, ""}};
+    plan.bands = {NitfBandPlan{"R", 0, 0, ""}, NitfBandPlan{"G", 0, 0, ""}, NitfBandPlan{"B", 0, 0, ""}};
     plan.IMODE = IMODE;
     plan.NBPR = 2;
     plan.NBPC = 2;
@@ -45,7 +45,7 @@ std::vector<uint8_t> Head(std::vector<uint8_t> row, size_t count)
 TEST(LineReader, EveryImodeGivesTheSameRowsAcrossPaddedBlocks)
 {
     for (char IMODE : {'B', 'P', 'R', 'S'}) {
-        const NitfImageSpec plan = BlockedRgb(IMODE);
+        const NitfImagePlan plan = BlockedRgb(IMODE);
         LoadedImage loaded(BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, Ramp))));
         ASSERT_TRUE(loaded.Open()) << IMODE;
         for (int32_t row = 0; row < plan.rows; ++row)
@@ -58,7 +58,7 @@ TEST(LineReader, EveryImodeGivesTheSameRowsAcrossPaddedBlocks)
 // A row costs about its own bytes: the scratch buffer holds one block row, not a block.
 TEST(LineReader, ScratchBufferHoldsOneRowOfABlock)
 {
-    NitfImageSpec plan = BlockedRgb('B');
+    NitfImagePlan plan = BlockedRgb('B');
     LoadedImage loaded(BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, Ramp))));
     ASSERT_TRUE(loaded.Open());
     EXPECT_EQ(loaded.image.lineBuffer.size(), 3u * 4u);
@@ -67,7 +67,7 @@ TEST(LineReader, ScratchBufferHoldsOneRowOfABlock)
 TEST(LineReader, MaskedBlocksThatAreNotStoredComeOutAsZeros)
 {
     for (char IMODE : {'B', 'P', 'S'}) {
-        NitfImageSpec plan = BlockedRgb(IMODE);
+        NitfImagePlan plan = BlockedRgb(IMODE);
         plan.IC = "NM";
         const std::vector<std::string> blocks = BuildImageBlocks(plan, Ramp);
         std::vector<bool> stored(blocks.size(), true);
@@ -86,7 +86,7 @@ TEST(LineReader, MaskedBlocksThatAreNotStoredComeOutAsZeros)
 
 TEST(LineReader, WideMonochromeKeepsTheTopSignificantBits)
 {
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.columns = 3;
     plan.NBPP = 16;
     plan.ABPP = 11;
@@ -113,9 +113,9 @@ TEST(LineReader, WideMonochromeKeepsTheTopSignificantBits)
 
 TEST(LineReader, Palettes)
 {
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.IREP = "RGB/LUT";
-    plan.bands = {NitfBandSpec{"LU", 3, 200, RgbLookupTables(200)}};
+    plan.bands = {NitfBandPlan{"LU", 3, 200, RgbLookupTables(200)}};
     LoadedImage lut(BuildImageFile(plan, "\x05"));
     ASSERT_TRUE(lut.Open());
     EXPECT_EQ(lut.image.GetPaletteSize(), 200);
@@ -125,7 +125,7 @@ TEST(LineReader, Palettes)
     EXPECT_FALSE(lut.image.GetPaletteEntry(200, red, green, blue)); // past the lookup data
     EXPECT_FALSE(lut.image.GetPaletteEntry(-1, red, green, blue));
 
-    NitfImageSpec mono; // no table: the grey ramp; 256 entries whatever NELUT says
+    NitfImagePlan mono; // no table: the grey ramp; 256 entries whatever NELUT says
     mono.NBPP = 16;
     LoadedImage grey(BuildImageFile(mono, std::string(2, '\0')));
     ASSERT_TRUE(grey.Open());
@@ -135,7 +135,7 @@ TEST(LineReader, Palettes)
     EXPECT_EQ(std::vector<uint8_t>({red, green, blue}), std::vector<uint8_t>({77, 77, 77}));
 
     mono.NBPP = 8;
-    mono.bands = {NitfBandSpec{"LU", 1, 10, "0123456789"}};
+    mono.bands = {NitfBandPlan{"LU", 1, 10, "0123456789"}};
     LoadedImage shortTable(BuildImageFile(mono, std::string(1, '\0')));
     ASSERT_TRUE(shortTable.Open());
     EXPECT_EQ(shortTable.image.GetPaletteSize(), 256);
@@ -146,7 +146,7 @@ TEST(LineReader, Palettes)
 
 TEST(LineReader, RefusesRowsAndSpansOutsideTheImage)
 {
-    const NitfImageSpec plan = BlockedRgb('P');
+    const NitfImagePlan plan = BlockedRgb('P');
     LoadedImage loaded(BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, Ramp))));
     ASSERT_TRUE(loaded.Open());
     std::vector<uint8_t> out(64, 0xEE);
@@ -160,16 +160,16 @@ TEST(LineReader, RefusesRowsAndSpansOutsideTheImage)
 // Layouts the reader cannot address safely are refused when the data is prepared.
 TEST(LineReader, RefusesGeometriesThatDoNotFitTheFile)
 {
-    const NitfImageSpec good = BlockedRgb('B');
+    const NitfImagePlan good = BlockedRgb('B');
     const std::string data = JoinBlocks(BuildImageBlocks(good, Ramp));
-    auto prepares = [&](const NitfImageSpec& plan, const std::string& bytes) {
+    auto prepares = [&](const NitfImagePlan& plan, const std::string& bytes) {
         LoadedImage loaded(BuildImageFile(plan, bytes));
         return loaded.Parse() && loaded.image.PrepareData(loaded.reader, uint32_t(bytes.size()));
     };
     EXPECT_TRUE(prepares(good, data));
     EXPECT_FALSE(prepares(good, data.substr(0, data.size() - 1))); // short final block
 
-    NitfImageSpec plan = good;
+    NitfImagePlan plan = good;
     plan.NPPBH = 0; // a block width of 0 with two blocks per row
     EXPECT_FALSE(prepares(plan, data));
     plan = good;
@@ -199,11 +199,11 @@ TEST(LineReader, RefusesGeometriesThatDoNotFitTheFile)
 
 TEST(LineReader, CompressedKindsWithoutDecodableDataFailTheirRows)
 {
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.IC = "C4";
     plan.COMRAT = "    ";
     plan.IREP = "RGB/LUT";
-    plan.bands = {NitfBandSpec{"LU", 3, 2, RgbLookupTables(2)}};
+    plan.bands = {NitfBandPlan{"LU", 3, 2, RgbLookupTables(2)}};
     LoadedImage vq(BuildImageFile(plan, std::string(16, '\0')));
     ASSERT_TRUE(vq.Open()); // served, as the file declares it, but no row decodes
     EXPECT_TRUE(vq.Row(0).empty());

@@ -33,7 +33,7 @@ RHHandle FreshHandle()
 // sections are missing: recognised as a frame, refused by the frame reader.
 std::string BrokenFrame(const std::string& tag = "RPFHDR", size_t headerDataLength = 48)
 {
-    NitfFileSpec plan;
+    NitfFilePlan plan;
     plan.images.push_back({std::string(100, 'x'), std::string(100, 'y')});
     plan.userHeaderData = Tre(tag, std::string(headerDataLength, '\0'));
     return BuildNitfFile(plan);
@@ -81,7 +81,7 @@ TEST(Exports, HandlesWithoutHandlerAnswerWithStatus5)
 TEST(Exports, HeaderFailuresLeaveTheHandleAlone)
 {
     const Handler& rh = LoadedHandler();
-    NitfFileSpec noImages;
+    NitfFilePlan noImages;
     TempFile empty(BuildNitfFile(noImages), ".ntf");
     TempFile notNitf("plain text, not an image", ".ntf");
     std::string overlong = "/tmp/" + std::string(300, 'p');

@@ -32,9 +32,9 @@ private:
     TempFile file_;
 };
 
-NitfFileSpec OneImage(bool version21)
+NitfFilePlan OneImage(bool version21)
 {
-    NitfFileSpec plan;
+    NitfFilePlan plan;
     plan.version21 = version21;
     plan.images.push_back({std::string(300, 'S'), std::string(1000, 'D')});
     return plan;
@@ -55,7 +55,7 @@ TEST(FieldNumbers, ConvertLikeAtolWithinWidth)
 
 TEST(NitfFileHeader, Nitf21WithEverySegmentGroup)
 {
-    NitfFileSpec plan = OneImage(true);
+    NitfFilePlan plan = OneImage(true);
     plan.images.push_back({"ab", "cdef"});
     plan.graphics.push_back({std::string(258, 'g'), "graphic"});
     plan.texts.push_back({std::string(282, 't'), "hello"});
@@ -90,7 +90,7 @@ TEST(NitfFileHeader, Nitf21WithEverySegmentGroup)
 
 TEST(NitfFileHeader, Nitf20WithAndWithoutDowngradeEvent)
 {
-    NitfFileSpec plan = OneImage(false);
+    NitfFilePlan plan = OneImage(false);
     plan.labels.push_back({std::string(320, 'l'), "label"});
     ParsedHeader plain(BuildNitfFile(plan));
     ASSERT_TRUE(plain.parsed);
@@ -110,7 +110,7 @@ TEST(NitfFileHeader, Nitf20WithAndWithoutDowngradeEvent)
 
 TEST(NitfFileHeader, RpfHeaderRecognisedOnlyWithLength62)
 {
-    NitfFileSpec plan = OneImage(true);
+    NitfFilePlan plan = OneImage(true);
     plan.userHeaderData = RpfUserHeaderData();
     ParsedHeader frame(BuildNitfFile(plan));
     ASSERT_TRUE(frame.parsed);
@@ -149,7 +149,7 @@ TEST(NitfFileHeader, RefusesWrongVersionsAndLengths)
 
 TEST(NitfFileHeader, RefusesLengthsThatLie)
 {
-    NitfFileSpec plan = OneImage(true);
+    NitfFilePlan plan = OneImage(true);
     plan.userHeaderData = Tre("ABCDEF", "x");
     // UDHDL of 1 or 2 would give a negative data size.
     for (int64_t lie : {1, 2}) {
@@ -176,7 +176,7 @@ TEST(NitfFileHeader, RefusesLengthsThatLie)
 
 TEST(NitfFileHeader, NoImageSegmentsStillParses)
 {
-    NitfFileSpec plan;
+    NitfFilePlan plan;
     ParsedHeader file(BuildNitfFile(plan));
     ASSERT_TRUE(file.parsed);
     EXPECT_EQ(file.header.NUMI, 0);

@@ -81,7 +81,7 @@ TEST_F(RpfBadInput, CodeBitLengthOtherThanTwelveOpensButEveryLineFails)
 
 TEST_F(RpfBadInput, LookupRecordsNarrowerOrWiderThanTheKernel)
 {
-    std::vector<uint8_t> expected = ExpectedRpfPixels(RpfFrameSpec{});
+    std::vector<uint8_t> expected = ExpectedRpfPixels(RpfFramePlan{});
     // Table 1 with 2 values per record: columns 2 and 3 of each code on rows 4k+1 show the masked pixel.
     auto narrow = OpenPatched(*frame_, [](RpfFrame& f) { PatchRpfNumber(f, LookupRecord(f, 1) + 6, 2, 2); });
     ASSERT_TRUE(narrow->opened);
@@ -195,7 +195,7 @@ TEST_F(RpfBadInput, CompressionSectionChecks)
     EXPECT_FALSE(Opens(frame, [&](RpfFrame& f) { PatchRpfNumber(f, f.layout.lookupSubsection + 4, 13, 2); }));
     auto second = OpenPatched(frame, [&](RpfFrame& f) { PatchRpfNumber(f, subheader, 2, 2); });
     ASSERT_TRUE(second->opened);
-    RpfFrameSpec plan;
+    RpfFramePlan plan;
     plan.maskedSubframes = {3};
     EXPECT_EQ(DecodeWholeFrame(*second), ExpectedRpfPixels(plan));
     auto tableless = OpenPatched(frame, [&](RpfFrame& f) { PatchRpfNumber(f, subheader + 2, 0, 2); });

@@ -35,7 +35,7 @@ namespace {
 
 void ExpectFrameDecodes(RpfProduct product, bool bigEndian, const std::set<uint32_t>& masked)
 {
-    RpfFrameSpec plan;
+    RpfFramePlan plan;
     plan.product = product;
     plan.bigEndian = bigEndian;
     plan.maskedSubframes = masked;
@@ -69,7 +69,7 @@ TEST(RpfFrameReader, MaskedSubframesDecodeToTheMaskedPixel)
 {
     ExpectFrameDecodes(RpfProduct::Cadrg, true, {1, 14, 20, 35});
 
-    RpfFrameSpec plan;
+    RpfFramePlan plan;
     plan.maskedSubframes = {1};
     auto opened = OpenFrame(BuildRpfFrame(plan));
     ASSERT_TRUE(opened->opened);
@@ -90,7 +90,7 @@ TEST(RpfFrameReader, MaskedSubframesDecodeToTheMaskedPixel)
 
 TEST(RpfFrameReader, ServesAnyColumnSpanAndRefusesSpansOutsideTheFrame)
 {
-    RpfFrameSpec plan;
+    RpfFramePlan plan;
     auto opened = OpenFrame(BuildRpfFrame(plan));
     ASSERT_TRUE(opened->opened);
     std::vector<uint8_t> expected = ExpectedRpfPixels(plan);
@@ -175,7 +175,7 @@ TEST(RpfFrameReader, PaletteTablesOfCadrgAndCib)
 
 TEST(RpfFrameReader, TableSelectionAmongSeveralTables)
 {
-    RpfFrameSpec plan;
+    RpfFramePlan plan;
     plan.colorTableRecords = {32};
     auto single = OpenFrame(BuildRpfFrame(plan));
     ASSERT_TRUE(single->opened);

@@ -53,7 +53,7 @@ std::vector<uint8_t> DecodeWholeFrame(OpenedFrame& frame)
 
 RpfFrame BuildTestFrame(RpfProduct product, bool bigEndian, std::set<uint32_t> masked)
 {
-    RpfFrameSpec plan;
+    RpfFramePlan plan;
     plan.product = product;
     plan.bigEndian = bigEndian;
     plan.maskedSubframes = std::move(masked);

@@ -35,27 +35,27 @@ uint64_t Wide(int32_t band, int32_t row, int32_t column)
     return (uint64_t(row) * 911 + uint64_t(column) * 37 + uint64_t(band)) & 0xFFF;
 }
 
-NitfImageSpec Blocked(const std::string& IREP, int bands)
+NitfImagePlan Blocked(const std::string& IREP, int bands)
 {
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.rows = kRows;
     plan.columns = kColumns;
     plan.IREP = IREP;
-    plan.bands.assign(bands, NitfBandSpec{});
+    plan.bands.assign(bands, NitfBandPlan{});
     plan.NBPR = (kColumns + kBlockSide - 1) / kBlockSide;
     plan.NBPC = (kRows + kBlockSide - 1) / kBlockSide;
     plan.NPPBH = plan.NPPBV = kBlockSide;
     return plan;
 }
 
-std::string Uncompressed(const NitfImageSpec& plan)
+std::string Uncompressed(const NitfImagePlan& plan)
 {
     return BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, Ramp)));
 }
 
 std::string Frame(RpfProduct product, bool bigEndian, std::set<uint32_t> masked)
 {
-    RpfFrameSpec plan;
+    RpfFramePlan plan;
     plan.product = product;
     plan.bigEndian = bigEndian;
     plan.indexImage = PatternIndexImage();
@@ -65,7 +65,7 @@ std::string Frame(RpfProduct product, bool bigEndian, std::set<uint32_t> masked)
 
 std::string MonoGeographic()
 {
-    NitfImageSpec plan = Blocked("MONO", 1);
+    NitfImagePlan plan = Blocked("MONO", 1);
     plan.ICORDS = 'G';
     plan.IGEOLO = kGeographic;
     return Uncompressed(plan);
@@ -73,7 +73,7 @@ std::string MonoGeographic()
 
 std::string RgbPixelInterleaved()
 {
-    NitfImageSpec plan = Blocked("RGB", 3);
+    NitfImagePlan plan = Blocked("RGB", 3);
     plan.bands[0].IREPBAND = "R";
     plan.bands[1].IREPBAND = "G";
     plan.bands[2].IREPBAND = "B";
@@ -85,7 +85,7 @@ std::string RgbPixelInterleaved()
 
 std::string RgbBandSequential20()
 {
-    NitfImageSpec plan = Blocked("RGB", 3);
+    NitfImagePlan plan = Blocked("RGB", 3);
     plan.version21 = false;
     plan.IMODE = 'S';
     plan.ICORDS = 'U';
@@ -95,7 +95,7 @@ std::string RgbBandSequential20()
 
 std::string RgbRowInterleavedUtm()
 {
-    NitfImageSpec plan = Blocked("RGB", 3);
+    NitfImagePlan plan = Blocked("RGB", 3);
     plan.IMODE = 'R';
     plan.ICORDS = 'N';
     plan.IGEOLO = kUtm;
@@ -104,7 +104,7 @@ std::string RgbRowInterleavedUtm()
 
 std::string LookupTable()
 {
-    NitfImageSpec plan = Blocked("RGB/LUT", 1);
+    NitfImagePlan plan = Blocked("RGB/LUT", 1);
     plan.bands[0].IREPBAND = "LU";
     plan.bands[0].NLUTS = 3;
     plan.bands[0].NELUT = 200;
@@ -114,7 +114,7 @@ std::string LookupTable()
 
 std::string Mono16()
 {
-    NitfImageSpec plan = Blocked("MONO", 1);
+    NitfImagePlan plan = Blocked("MONO", 1);
     plan.NBPP = 16;
     plan.ABPP = 12;
     return BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, Wide)));
@@ -122,7 +122,7 @@ std::string Mono16()
 
 std::string MaskedBlocks()
 {
-    NitfImageSpec plan = Blocked("MONO", 1);
+    NitfImagePlan plan = Blocked("MONO", 1);
     plan.IC = "NM";
     std::vector<std::string> blocks = BuildImageBlocks(plan, Ramp);
     std::vector<bool> stored(blocks.size(), true);
@@ -132,17 +132,17 @@ std::string MaskedBlocks()
 
 std::string Jpeg(int components)
 {
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.rows = plan.columns = kJpegSide;
     plan.IC = "C3";
     plan.COMRAT = "00.0";
     plan.IREP = components == 1 ? "MONO" : "YCbCr601";
-    plan.bands.assign(components, NitfBandSpec{});
+    plan.bands.assign(components, NitfBandPlan{});
     plan.IMODE = components == 1 ? 'B' : 'P';
-    JpegBlockSpec block;
+    JpegBlockPlan block;
     block.width = block.height = kJpegSide;
     block.components = components;
-    NitfApp6Spec app6;
+    NitfApp6Plan app6;
     app6.streamColor = components == 1 ? 0 : 2;
     Bytes data = BuildNitfJpegData({EncodeJpegBlock(TestPattern(kJpegSide, kJpegSide, components, 7), block)}, app6);
     return BuildImageFile(plan, std::string(data.begin(), data.end()));
@@ -150,7 +150,7 @@ std::string Jpeg(int components)
 
 std::string BiLevel()
 {
-    NitfImageSpec plan;
+    NitfImagePlan plan;
     plan.rows = kFaxHeight;
     plan.columns = kFaxWidth;
     plan.IC = "C1";
