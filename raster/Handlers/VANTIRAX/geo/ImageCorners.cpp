@@ -2,7 +2,7 @@
 
 #include "geo/Mgrs.h"
 #include "geo/Utm.h"
-#include "nitf/FieldNumbers.h"
+#include "base/FieldNumbers.h"
 
 #include <cmath>
 

@@ -1,7 +1,7 @@
 #include "imaging/FileLoader.h"
 
 #include "imaging/BitmapKernel.h"
-#include "plugin/FileCalls.h"
+#include "base/FileCalls.h"
 
 #include <cstdlib>
 #include <memory>

@@ -1,7 +1,7 @@
 #include "imaging/LeadToolLibWrapper.h"
 
 #include "imaging/NitfJpegDefaults.h"
-#include "plugin/ByteOrder.h"
+#include "base/ByteOrder.h"
 
 #include <cstring>
 #include <memory>

@@ -10,7 +10,7 @@
 #pragma once
 
 #include "imaging/ImagingLibrary.h"
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 
 #include <cstdint>
 

@@ -1,9 +1,9 @@
 // ReadSubheader: the image subheader of the first image segment, in the NITF
 // 2.0 and 2.1 layouts, and the mask table that leads masked image data.
-#include "nitf/FieldNumbers.h"
+#include "base/FieldNumbers.h"
 #include "nitf/NitfImage.h"
 #include "nitf/SubheaderCursor.h"
-#include "plugin/ByteOrder.h"
+#include "base/ByteOrder.h"
 
 #include <cstring>
 #include <strings.h>

@@ -1,7 +1,7 @@
 #include "nitf/NitfFileHeader.h"
 
-#include "nitf/FieldNumbers.h"
-#include "plugin/FileReader.h"
+#include "base/FieldNumbers.h"
+#include "base/FileReader.h"
 
 #include <cstring>
 #include <new>

@@ -7,7 +7,7 @@
 
 #include "imaging/LeadToolLibWrapper.h"
 #include "nitf/NitfBand.h"
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 
 #include <cstdint>
 #include <memory>

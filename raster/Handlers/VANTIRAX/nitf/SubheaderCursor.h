@@ -4,7 +4,7 @@
 // bytes that are really there before anything is allocated for it.
 #pragma once
 
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 
 #include <cstdint>
 

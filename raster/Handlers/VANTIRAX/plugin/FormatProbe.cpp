@@ -3,7 +3,7 @@
 #include "nitf/NitfFileHeader.h"
 #include "nitf/NitfImage.h"
 #include "plugin/FailureCodes.h"
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 
 bool ProbeFormat(const char* path)
 {

@@ -5,7 +5,7 @@
 #pragma once
 
 #include "nitf/NitfImage.h"
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 #include "plugin/HostRecords.h"
 #include "rpf/RpfFrameReader.h"
 

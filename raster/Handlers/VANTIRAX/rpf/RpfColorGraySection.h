@@ -2,7 +2,7 @@
 // values of the frame index, and the choice of the 216-record table among them.
 #pragma once
 
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 #include "rpf/RpfValueTable.h"
 
 #include <cstdint>

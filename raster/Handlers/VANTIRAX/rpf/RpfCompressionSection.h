@@ -2,7 +2,7 @@
 // row, record c of table r holding the pixel values of kernel row r for code c.
 #pragma once
 
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 #include "rpf/RpfValueTable.h"
 
 #include <cstdint>

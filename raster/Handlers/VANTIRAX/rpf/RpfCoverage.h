@@ -2,7 +2,7 @@
 // longitude, then its resolutions and intervals.
 #pragma once
 
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 
 #include <cstdint>
 

@@ -3,8 +3,8 @@
 // checked against the file before they are made.
 #pragma once
 
-#include "plugin/ByteOrder.h"
-#include "plugin/FileReader.h"
+#include "base/ByteOrder.h"
+#include "base/FileReader.h"
 
 #include <cstdint>
 

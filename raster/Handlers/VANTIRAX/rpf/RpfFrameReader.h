@@ -3,7 +3,7 @@
 // the VQ codes stay on disk, read a code row at a time as lines are served.
 #pragma once
 
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 #include "rpf/RpfColorGraySection.h"
 #include "rpf/RpfCompressionSection.h"
 #include "rpf/RpfCoverage.h"

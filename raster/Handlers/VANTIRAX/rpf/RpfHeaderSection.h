@@ -2,7 +2,7 @@
 // header's user-defined header data.
 #pragma once
 
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 
 #include <cstdint>
 

@@ -3,7 +3,7 @@
 // across the subframes that a column span touches.
 #pragma once
 
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 
 #include <cstdint>
 #include <vector>

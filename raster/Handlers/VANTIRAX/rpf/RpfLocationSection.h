@@ -2,7 +2,7 @@
 // named by its MIL-STD-2411 component ID and found at an absolute file offset.
 #pragma once
 
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 
 #include <cstdint>
 #include <vector>

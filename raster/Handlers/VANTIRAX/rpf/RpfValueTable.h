@@ -2,7 +2,7 @@
 // lookup subsection and the colour/grayscale tables of the colormap subsection.
 #pragma once
 
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 
 #include <cstdint>
 #include <vector>

@@ -2,7 +2,7 @@
 #include "imaging/LeadToolLibWrapper.h"
 #include "imaging/NitfJpegDefaults.h"
 #include "imaging/tests/DecoderTestFile.h"
-#include "plugin/ByteOrder.h"
+#include "base/ByteOrder.h"
 #include "tests/fixtures/BiLevelWriter.h"
 
 #include <gtest/gtest.h>

@@ -2,7 +2,7 @@
 // CFileReader, as the decoder meets it inside a NITF file.
 #pragma once
 
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 #include "tests/fixtures/TempFiles.h"
 
 #include <cstdint>

@@ -4,7 +4,7 @@
 
 #include "nitf/NitfFileHeader.h"
 #include "nitf/NitfImage.h"
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 #include "tests/fixtures/TempFiles.h"
 
 #include <string>

@@ -1,4 +1,4 @@
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 #include "plugin/Palette.h"
 
 #include <gtest/gtest.h>

@@ -1,4 +1,4 @@
-#include "nitf/FieldNumbers.h"
+#include "base/FieldNumbers.h"
 #include "nitf/NitfFileHeader.h"
 #include "tests/fixtures/NitfFileWriter.h"
 #include "tests/fixtures/TempFiles.h"

@@ -2,7 +2,7 @@
 // opened through a CFileReader, and whole-frame decoding.
 #pragma once
 
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 #include "rpf/RpfFrameReader.h"
 #include "tests/fixtures/RpfFrameWriter.h"
 

@@ -1,7 +1,7 @@
 // File calls over POSIX descriptors.
-#include "plugin/FileCalls.h"
+#include "base/FileCalls.h"
 
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 
 #include <cerrno>
 #include <fcntl.h>

@@ -1,4 +1,4 @@
-#include "nitf/FieldNumbers.h"
+#include "base/FieldNumbers.h"
 
 #include <cstdlib>
 #include <cstring>

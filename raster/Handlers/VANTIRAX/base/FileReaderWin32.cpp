@@ -1,8 +1,8 @@
 // File calls over the Windows HFILE functions (_lopen, _lread, _llseek,
 // _lclose).
-#include "plugin/FileCalls.h"
+#include "base/FileCalls.h"
 
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 
 #include <windows.h>
 

@@ -1,6 +1,6 @@
-#include "plugin/FileReader.h"
+#include "base/FileReader.h"
 
-#include "plugin/FileCalls.h"
+#include "base/FileCalls.h"
 
 #include <cstring>
 
