@@ -98,15 +98,19 @@ void SetModelTags(TIFF* tiff, const GeoTransform& t)
     TIFFSetField(tiff, TIFFTAG_GEOTRANSMATRIX, 16, matrix);
 }
 
+// Without an EPSG code only the raster type is written: the transform
+// places the image, in no coordinate system.
 bool SetGeoKeys(TIFF* tiff, uint32_t epsg)
 {
     GTIF* keys = GTIFNew(tiff);
     if (keys == nullptr)
         return false;
-    const bool geographic = epsg >= kFirstGeographicCode && epsg <= kLastGeographicCode;
-    GTIFKeySet(keys, GTModelTypeGeoKey, TYPE_SHORT, 1, geographic ? ModelTypeGeographic : ModelTypeProjected);
     GTIFKeySet(keys, GTRasterTypeGeoKey, TYPE_SHORT, 1, RasterPixelIsArea);
-    GTIFKeySet(keys, geographic ? GeographicTypeGeoKey : ProjectedCSTypeGeoKey, TYPE_SHORT, 1, int(epsg));
+    if (epsg != kNoEpsgCode) {
+        const bool geographic = epsg >= kFirstGeographicCode && epsg <= kLastGeographicCode;
+        GTIFKeySet(keys, GTModelTypeGeoKey, TYPE_SHORT, 1, geographic ? ModelTypeGeographic : ModelTypeProjected);
+        GTIFKeySet(keys, geographic ? GeographicTypeGeoKey : ProjectedCSTypeGeoKey, TYPE_SHORT, 1, int(epsg));
+    }
     const bool written = GTIFWriteKeys(keys) != 0;
     GTIFFree(keys);
     return written;
