@@ -98,19 +98,15 @@ void SetModelTags(TIFF* tiff, const GeoTransform& t)
     TIFFSetField(tiff, TIFFTAG_GEOTRANSMATRIX, 16, matrix);
 }
 
-// Without an EPSG code only the raster type is written: the transform
-// places the image, in no coordinate system.
 bool SetGeoKeys(TIFF* tiff, uint32_t epsg)
 {
     GTIF* keys = GTIFNew(tiff);
     if (keys == nullptr)
         return false;
+    const bool geographic = epsg >= kFirstGeographicCode && epsg <= kLastGeographicCode;
+    GTIFKeySet(keys, GTModelTypeGeoKey, TYPE_SHORT, 1, geographic ? ModelTypeGeographic : ModelTypeProjected);
     GTIFKeySet(keys, GTRasterTypeGeoKey, TYPE_SHORT, 1, RasterPixelIsArea);
-    if (epsg != kNoEpsgCode) {
-        const bool geographic = epsg >= kFirstGeographicCode && epsg <= kLastGeographicCode;
-        GTIFKeySet(keys, GTModelTypeGeoKey, TYPE_SHORT, 1, geographic ? ModelTypeGeographic : ModelTypeProjected);
-        GTIFKeySet(keys, geographic ? GeographicTypeGeoKey : ProjectedCSTypeGeoKey, TYPE_SHORT, 1, int(epsg));
-    }
+    GTIFKeySet(keys, geographic ? GeographicTypeGeoKey : ProjectedCSTypeGeoKey, TYPE_SHORT, 1, int(epsg));
     const bool written = GTIFWriteKeys(keys) != 0;
     GTIFFree(keys);
     return written;
@@ -144,8 +140,10 @@ bool WriteGeoTiff(const std::string& path, const Raster& raster, const GeoRefere
     SetImageTags(tiff, raster);
     bool written = true;
     if (geo != nullptr) {
+        // Without an EPSG code the transform places the image in no
+        // coordinate system: no keys at all, so that none is implied.
         SetModelTags(tiff, geo->transform);
-        written = SetGeoKeys(tiff, geo->epsg);
+        written = geo->epsg == kNoEpsgCode || SetGeoKeys(tiff, geo->epsg);
     }
     written = written && WriteStrips(tiff, raster) && TIFFFlush(tiff) != 0;
     XTIFFClose(tiff);

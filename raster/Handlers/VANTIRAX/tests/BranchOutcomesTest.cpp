@@ -71,26 +71,6 @@ TEST(RpfFrameOutcomes, CadrgFrameWithMaskedSubframes)
             << row;
 }
 
-// The north-east and south-west longitudes lie within 180 degrees of the
-// north-west one: a frame across the 180 degree meridian keeps a positive width.
-TEST(RpfFrameOutcomes, FrameAcross180DegreesKeepsRunningEast)
-{
-    struct Case {
-        double west, east, servedEast;
-    };
-    for (const Case& c : {Case{179.75, -179.75, 180.25}, Case{179.5, 180.0, 180.0}, Case{-180.0, -179.5, -179.5}}) {
-        RpfFramePlan layout;
-        layout.corners.northWestLongitude = layout.corners.southWestLongitude = c.west;
-        layout.corners.northEastLongitude = layout.corners.southEastLongitude = c.east;
-        TempFile file(BuildRpfFrame(layout).bytes, ".ntf");
-        OpenedImage image(Handler(), file.path());
-        ASSERT_TRUE(image.Ready() && image.handle.geoRef != nullptr) << c.west;
-        EXPECT_DOUBLE_EQ(image.handle.geoRef->points[0].worldX, c.west);
-        EXPECT_DOUBLE_EQ(image.handle.geoRef->points[1].worldX, c.servedEast);
-        EXPECT_DOUBLE_EQ(image.handle.geoRef->points[2].worldX, c.west);
-    }
-}
-
 TEST(RpfFrameOutcomes, LittleEndianCibFrameHasAGreyPalette)
 {
     RpfFramePlan layout;
