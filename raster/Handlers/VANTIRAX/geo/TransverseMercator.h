@@ -25,8 +25,8 @@ constexpr uint32_t kTmDistortionWarning = 0x0400;  // more than 9 degrees from t
 // Parameters of one projection; the defaults are WGS 84 on the Greenwich
 // meridian at unit scale. Angles in radians, distances in metres.
 struct TransverseMercatorParams {
-    double a = kWgs84SemiMajorAxis;
-    double b = kWgs84SemiMinorAxis;
+    double a = kWgs84SemiMajorAxis;       // semi-major axis
+    double b = kWgs84SemiMinorAxis;       // semi-minor axis
     double es = kWgs84EccentricitySquared; // first eccentricity squared
     double ebs = (a * a - b * b) / (b * b); // second eccentricity squared
     double phi0 = 0.0;                    // latitude of origin
