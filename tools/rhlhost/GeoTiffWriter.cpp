@@ -140,8 +140,10 @@ bool WriteGeoTiff(const std::string& path, const Raster& raster, const GeoRefere
     SetImageTags(tiff, raster);
     bool written = true;
     if (geo != nullptr) {
+        // Without an EPSG code the transform places the image in no
+        // coordinate system: no keys at all, so that none is implied.
         SetModelTags(tiff, geo->transform);
-        written = SetGeoKeys(tiff, geo->epsg);
+        written = geo->epsg == kNoEpsgCode || SetGeoKeys(tiff, geo->epsg);
     }
     written = written && WriteStrips(tiff, raster) && TIFFFlush(tiff) != 0;
     XTIFFClose(tiff);

@@ -1,5 +1,7 @@
 #include "GeoTransform.h"
 
+#include <cmath>
+
 namespace host {
 namespace {
 
@@ -32,6 +34,12 @@ bool TransformFromGeoRef(const OpenedImage& image, GeoTransform& transform, std:
     transform.columnY = (p[1].y - p[0].y) / w;
     transform.rowX = (p[2].x - p[0].x) / h;
     transform.rowY = (p[2].y - p[0].y) / h;
+    // Corners on one point or one line (all zero when ICORDS has no form) place nothing.
+    const double pixelArea = transform.columnX * transform.rowY - transform.columnY * transform.rowX;
+    if (!std::isfinite(pixelArea) || pixelArea == 0) {
+        message = "the georeference's corners span no area";
+        return false;
+    }
     return true;
 }
 

@@ -27,8 +27,8 @@ struct GeoTransform {
     bool NorthUp() const { return columnY == 0 && rowX == 0; }
 };
 
-// False with a message when the record is missing or its points are not at
-// the corner pixels of the image.
+// False with a message when the record is missing, its points are not at
+// the corner pixels of the image or its corners span no area.
 bool TransformFromGeoRef(const OpenedImage& image, GeoTransform& transform, std::string& message);
 
 // The same map for a window whose first pixel is (column, row) of the image.

@@ -26,6 +26,9 @@ struct Exports {
 // Loads the handler file; false with a message when it or an export is missing.
 bool LoadHandler(const std::string& path, Exports& exports, std::string& message);
 
+// The georeference record's EPSG code when its corners name no coordinate system.
+constexpr uint32_t kNoEpsgCode = 0;
+
 struct ControlPoint {
     double column, row, x, y;
 };
@@ -40,7 +43,7 @@ struct OpenedImage {
     bool hasPalette = false;
     std::vector<uint8_t> palette; // entries x (r, g, b)
     bool hasGeoRef = false;
-    uint32_t epsg = 0;
+    uint32_t epsg = 0; // kNoEpsgCode: corners in no named coordinate system
     std::vector<ControlPoint> points;
 };
 

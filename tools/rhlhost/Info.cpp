@@ -82,6 +82,8 @@ void PrintGeoReference(const OpenedImage& image)
 
 std::string DescribeCoordinateSystem(uint32_t epsg)
 {
+    if (epsg == kNoEpsgCode)
+        return "no coordinate system (EPSG code 0)";
     std::string code = "EPSG:" + std::to_string(epsg);
     if (epsg == kWgs84Geographic)
         return code + " (WGS 84 longitude, latitude in degrees)";

@@ -12,6 +12,7 @@ namespace {
 // Frames of one product share their pixel size to far better than this.
 constexpr double kScaleTolerance = 1e-6;
 constexpr double kMaxMosaicPixels = double(1u << 28);
+constexpr double kTurnDegrees = 360.0;
 
 bool Refuse(MosaicFrames& collected, const std::string& path, const std::string& reason)
 {
@@ -44,6 +45,36 @@ bool AddFrame(const Exports& rh, const InputFile& file, MosaicFrames& collected)
 bool SameScale(double a, double b)
 {
     return std::fabs(a - b) <= kScaleTolerance * std::fabs(b);
+}
+
+// The west edge where the frames' longitude range starts: the one after the
+// widest gap between west edges around the globe, so that a product across
+// the 180 degree meridian is not split at it.
+double RangeStart(const std::vector<MosaicFrame>& frames)
+{
+    std::vector<double> wests;
+    for (const MosaicFrame& f : frames)
+        wests.push_back(f.transform.originX);
+    std::sort(wests.begin(), wests.end());
+    double start = wests.front();
+    double widestGap = wests.front() + kTurnDegrees - wests.back();
+    for (size_t i = 1; i < wests.size(); ++i) {
+        if (wests[i] - wests[i - 1] > widestGap) {
+            widestGap = wests[i] - wests[i - 1];
+            start = wests[i];
+        }
+    }
+    return start;
+}
+
+// Moves frames west of the range's start by a whole turn east, into one
+// longitude range: a frame at -179.5 follows one at 179.5 as 180.5.
+void PutInOneLongitudeRange(std::vector<MosaicFrame>& frames)
+{
+    const double start = RangeStart(frames);
+    for (MosaicFrame& f : frames)
+        if (f.transform.originX < start)
+            f.transform.originX += kTurnDegrees;
 }
 
 } // namespace
@@ -80,6 +111,7 @@ bool PlanGrid(MosaicFrames& collected, MosaicGrid& grid, std::string& message)
     for (auto it = other; it != frames.end(); ++it)
         Refuse(collected, it->path, "its pixel size differs from the first frame's");
     frames.erase(other, frames.end());
+    PutInOneLongitudeRange(frames);
 
     double west = HUGE_VAL, north = -HUGE_VAL, east = -HUGE_VAL, south = HUGE_VAL;
     for (const MosaicFrame& f : frames) {

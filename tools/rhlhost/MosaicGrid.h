@@ -39,8 +39,10 @@ struct MosaicFrames {
 // Opens every file the handler recognises and keeps the north-up EPSG 4326 frames.
 MosaicFrames CollectFrames(const Exports& rh, const std::vector<InputFile>& files);
 
-// Drops frames whose scale differs from the first frame's (with a refusal)
-// and sizes the grid that holds the rest; false with a message when it is too large.
+// Drops frames whose scale differs from the first frame's (with a refusal),
+// moves the rest into one longitude range (a product across the 180 degree
+// meridian stays in one piece) and sizes the grid that holds them; false with
+// a message when it is too large.
 bool PlanGrid(MosaicFrames& collected, MosaicGrid& grid, std::string& message);
 
 } // namespace host

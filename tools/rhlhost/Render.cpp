@@ -35,7 +35,7 @@ bool WriteRaw(const std::string& path, const Pixels& pixels, std::string& messag
 }
 
 // The window's georeference; null when the image has none, with a warning
-// when the record it has cannot be used.
+// when the record it has cannot be used or names no coordinate system.
 const GeoReference* WindowGeoReference(const OpenedImage& image, const Pixels& pixels, GeoReference& geo,
                                        std::string& warning)
 {
@@ -48,6 +48,8 @@ const GeoReference* WindowGeoReference(const OpenedImage& image, const Pixels& p
     }
     geo.epsg = image.epsg;
     geo.transform = ShiftedTo(whole, pixels.x0, pixels.y0);
+    if (image.epsg == kNoEpsgCode)
+        warning = "written without a coordinate system: the georeference names none (EPSG code 0)";
     return &geo;
 }
 

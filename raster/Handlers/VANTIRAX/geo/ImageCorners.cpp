@@ -1,7 +1,10 @@
 #include "geo/ImageCorners.h"
 
+#include "geo/Angles.h"
 #include "geo/Mgrs.h"
 #include "geo/Utm.h"
+#include "geo/Wgs84.h"
+
 #include "base/FieldNumbers.h"
 
 #include <cmath>
@@ -13,7 +16,7 @@ constexpr unsigned kFirstSlot = 0;
 constexpr unsigned kSecondSlot = kSlotLength;
 constexpr unsigned kFourthSlot = 3 * kSlotLength;  // the third slot is not used
 
-enum class CornerForm { kNone, kGeographic, kDecimalDegrees, kUtm, kMgrs };
+enum class CornerForm { kNone, kGeographic, kGeocentric, kDecimalDegrees, kUtm, kMgrs };
 
 CornerForm FormOf(const ImageCornerFields& fields)
 {
@@ -21,8 +24,9 @@ CornerForm FormOf(const ImageCornerFields& fields)
         return CornerForm::kNone;
     switch (fields.icords) {
     case 'G':
-    case 'C':  // geocentric by name, but written and read as geographic "G"
         return CornerForm::kGeographic;
+    case 'C':
+        return CornerForm::kGeocentric;
     case 'D':
         return CornerForm::kDecimalDegrees;
     case 'N':
@@ -66,6 +70,21 @@ double ReadDegreesMinutesSeconds(const char* text, unsigned degreeDigits, char n
     return text[degreeDigits + 4] == negativeHemisphere ? -value : value;
 }
 
+// "C" slots are written as "G" slots, but their latitudes are geocentric (the
+// angle at the earth's centre): the geodetic latitude of the same point has
+// tan(geodetic) = tan(geocentric) / (1 - e^2).
+double GeodeticLatitude(double geocentricDegrees)
+{
+    const double psi = DegreesToRadians(geocentricDegrees);
+    return RadiansToDegrees(std::atan2(std::sin(psi), (1.0 - kWgs84EccentricitySquared) * std::cos(psi)));
+}
+
+bool InDegrees(CornerForm form)
+{
+    return form == CornerForm::kGeographic || form == CornerForm::kGeocentric ||
+           form == CornerForm::kDecimalDegrees;
+}
+
 // Converts one slot's 15 characters as a reference of their own (the slots
 // of IGEOLO follow each other unterminated). A corner outside its latitude
 // band still has its grid position; any other rejected reference gives zone
@@ -85,8 +104,11 @@ void ReadSlot(CornerForm form, const char* slot, double& x, double& y)
 {
     switch (form) {
     case CornerForm::kGeographic:
+    case CornerForm::kGeocentric:
         y = ReadDegreesMinutesSeconds(slot, 2, 'S');
         x = ReadDegreesMinutesSeconds(slot + 7, 3, 'W');
+        if (form == CornerForm::kGeocentric)
+            y = GeodeticLatitude(y);
         break;
     case CornerForm::kDecimalDegrees:
         y = ReadNumber(slot, 7);
@@ -136,12 +158,17 @@ void ReadImageCorners(const ImageCornerFields& fields, double& x1, double& y1, d
     ReadSlot(form, igeolo.Slot(kFirstSlot), x1, y1);
     ReadSlot(form, igeolo.Slot(kSecondSlot), x2, y2);
     ReadSlot(form, igeolo.Slot(kFourthSlot), x3, y3);
+    if (InDegrees(form)) {
+        x2 = LongitudeNear(x2, x1);
+        x3 = LongitudeNear(x3, x1);
+    }
 }
 
 int32_t ImageCornerEpsgCode(const ImageCornerFields& fields, int32_t geographicCode) noexcept
 {
     switch (FormOf(fields)) {
     case CornerForm::kGeographic:
+    case CornerForm::kGeocentric:
     case CornerForm::kDecimalDegrees:
         return geographicCode;
     case CornerForm::kUtm:

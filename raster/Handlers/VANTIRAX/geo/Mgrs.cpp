@@ -2,13 +2,11 @@
 
 #include "geo/Angles.h"
 #include "geo/Utm.h"
+#include "geo/Wgs84.h"
 
 #include <cmath>
 
 namespace {
-
-constexpr double kWgs84SemiMajorAxis = 6378137.0;
-constexpr double kWgs84SemiMinorAxis = 6356752.3142;
 
 constexpr int32_t kMaxZoneDigits = 2;
 constexpr int32_t kMaxReferenceDigits = 2 * kMgrsMaxPrecision;

@@ -5,6 +5,8 @@
 // than 9 degrees away carry a warning bit.
 #pragma once
 
+#include "geo/Wgs84.h"
+
 #include <cstdint>
 
 // Projection status bits.
@@ -23,10 +25,10 @@ constexpr uint32_t kTmDistortionWarning = 0x0400;  // more than 9 degrees from t
 // Parameters of one projection; the defaults are WGS 84 on the Greenwich
 // meridian at unit scale. Angles in radians, distances in metres.
 struct TransverseMercatorParams {
-    double a = 6378137.0;                 // semi-major axis
-    double b = 6356752.3142;              // semi-minor axis
-    double es = 0.00669437999014138;      // first eccentricity squared
-    double ebs = 0.0067394967565869;      // second eccentricity squared
+    double a = kWgs84SemiMajorAxis;       // semi-major axis
+    double b = kWgs84SemiMinorAxis;       // semi-minor axis
+    double es = kWgs84EccentricitySquared; // first eccentricity squared
+    double ebs = (a * a - b * b) / (b * b); // second eccentricity squared
     double phi0 = 0.0;                    // latitude of origin
     double lambda0 = 0.0;                 // central meridian, within [-pi, pi]
     double FN = 0.0;                      // false northing

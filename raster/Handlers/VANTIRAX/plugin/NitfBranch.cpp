@@ -15,7 +15,10 @@ namespace {
 constexpr char kNoCorners = ' ';
 
 // The georeference record of the image corners, or null when the subheader
-// has none (or the record cannot be allocated).
+// has none (or the record cannot be allocated). Corners whose coordinate
+// system cannot be named (a UTM zone outside 1 to 60, a rejected first MGRS
+// reference, an unknown ICORDS) keep the code kEpsgNone: the host sees the
+// corners and no coordinate system, never metres labelled as degrees.
 RHGeoRef* CornerGeoRef(const CNitfImage& image, uint32_t width, uint32_t height)
 {
     if (image.ICORDS() == kNoCorners || image.IGEOLO == nullptr)
@@ -24,9 +27,7 @@ RHGeoRef* CornerGeoRef(const CNitfImage& image, uint32_t width, uint32_t height)
     double corners[3][2] = {};
     ReadImageCorners(fields, corners[0][0], corners[0][1], corners[1][0], corners[1][1], corners[2][0],
                      corners[2][1]);
-    int32_t epsgCode = ImageCornerEpsgCode(fields, int32_t(kEpsgGeographic));
-    if (epsgCode == kEpsgNone)
-        epsgCode = int32_t(kEpsgGeographic);
+    const int32_t epsgCode = ImageCornerEpsgCode(fields, int32_t(kEpsgGeographic));
     return CreateGeoRef(uint32_t(epsgCode), width, height, corners);
 }
 

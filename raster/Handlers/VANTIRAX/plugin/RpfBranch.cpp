@@ -2,6 +2,7 @@
 // extension in the NITF file header, described to the host as a 1536 x 1536
 // paletted image tied to its coverage corners, and drawn line by line by the
 // handler's RPF frame reader.
+#include "geo/Angles.h"
 #include "nitf/NitfFileHeader.h"
 #include "plugin/GeoRefRecord.h"
 #include "plugin/Palette.h"
@@ -51,11 +52,13 @@ int32_t CRasterHandler::RpfOpen(RHHandle* handle, CFileReader& reader, const CNi
     handle->pixelKind = paletted ? kPixelPaletted : kPixelRpfNoTable;
 
     // Control points (0, 0), (1535, 0) and (0, 1535): the north-west,
-    // north-east and south-west corners, longitude before latitude.
+    // north-east and south-west corners, longitude before latitude. A frame
+    // across the 180 degree meridian keeps running east (LongitudeNear).
     const RpfCoverage& coverage = rpfReader.coverage;
-    const double corners[3][2] = {{coverage.northWestLongitude, coverage.northWestLatitude},
-                                  {coverage.northEastLongitude, coverage.northEastLatitude},
-                                  {coverage.southWestLongitude, coverage.southWestLatitude}};
+    const double west = coverage.northWestLongitude;
+    const double corners[3][2] = {{west, coverage.northWestLatitude},
+                                  {LongitudeNear(coverage.northEastLongitude, west), coverage.northEastLatitude},
+                                  {LongitudeNear(coverage.southWestLongitude, west), coverage.southWestLatitude}};
     handle->geoRef = CreateGeoRef(kEpsgGeographic, kRpfFrameSize, kRpfFrameSize, corners);
     if (handle->geoRef == nullptr)
         return 0;

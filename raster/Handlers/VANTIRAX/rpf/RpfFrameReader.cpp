@@ -37,8 +37,10 @@ uint32_t CRpfFrameReader::FindComponentLocation(uint16_t componentId) const
 
 void CRpfFrameReader::PrepareDraw(uint32_t width)
 {
-    // A span of width columns touches at most width / kernel width + 2 codes.
-    codeCapacity = width / imageSection.kernelWidth + 2;
+    // Only columns inside the frame are ever read, however wide the host's
+    // span: a span of width columns touches at most width / kernel width + 2 codes.
+    const uint32_t servedWidth = std::min(width, imageSection.totalColumns);
+    codeCapacity = servedWidth / imageSection.kernelWidth + 2;
     codeBuffer.assign(codeCapacity, 0);
     codesHeld = false;
     imageSection.ReleaseSubframeCache();

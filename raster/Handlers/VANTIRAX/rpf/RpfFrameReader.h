@@ -33,7 +33,7 @@ public:
     bool Open(CFileReader& reader, uint32_t headerSectionOffset);
     uint32_t FindComponentLocation(uint16_t componentId) const;
 
-    // Sizes the code buffer for a draw of width columns.
+    // Sizes the code buffer for a draw of width columns, clipped to the frame's.
     void PrepareDraw(uint32_t width);
     // Palette indices of columns firstColumn..lastColumn (inclusive) of
     // imageRow into output, through the draw's reader.

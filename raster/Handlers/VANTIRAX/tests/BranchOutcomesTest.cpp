@@ -184,31 +184,52 @@ TEST(PlainNitfOutcomes, SixteenBitMonoIsGreyPaletted)
     EXPECT_EQ(palette[77 * 3 + 2], 77);
 }
 
-TEST(PlainNitfOutcomes, CornersGiveTheEpsgCode)
+// The record the host reads: the corners in their own units, and an EPSG
+// code only when the corners name their coordinate system (0 otherwise).
+TEST(PlainNitfOutcomes, CornersAndTheirEpsgCode)
 {
-    NitfImagePlan geographic = Rgb(10, 20);
-    geographic.ICORDS = 'G';
-    geographic.IGEOLO = "400000N1000000W400000N0993000W393000N0993000W393000N1000000W";
-    TempFile geographicFile(PlainImage(geographic), ".ntf");
-    OpenedImage degrees(Handler(), geographicFile.path());
-    ASSERT_TRUE(degrees.Ready());
-    ASSERT_NE(degrees.handle.geoRef, nullptr);
-    EXPECT_EQ(degrees.handle.geoRef->epsgCode, 4326u);
-    EXPECT_DOUBLE_EQ(degrees.handle.geoRef->points[1].worldX, -99.5);
-    EXPECT_DOUBLE_EQ(degrees.handle.geoRef->points[1].column, 19);
-    EXPECT_DOUBLE_EQ(degrees.handle.geoRef->points[2].worldY, 39.5);
-    EXPECT_DOUBLE_EQ(degrees.handle.geoRef->points[2].row, 9);
-
-    NitfImagePlan utm = Rgb(10, 20);
-    utm.ICORDS = 'N';
-    utm.IGEOLO = "335000004400000335010004400000335010004399000335000004399000";
-    TempFile utmFile(PlainImage(utm), ".ntf");
-    OpenedImage metres(Handler(), utmFile.path());
-    ASSERT_TRUE(metres.Ready());
-    ASSERT_NE(metres.handle.geoRef, nullptr);
-    EXPECT_EQ(metres.handle.geoRef->epsgCode, 32633u);
-    EXPECT_DOUBLE_EQ(metres.handle.geoRef->points[0].worldX, 500000);
-    EXPECT_DOUBLE_EQ(metres.handle.geoRef->points[2].worldY, 4399000);
+    struct Case {
+        char icords;
+        const char* igeolo;
+        uint32_t epsg;
+        double points[3][2]; // world x, y of (0, 0), (19, 0), (0, 9)
+    };
+    const Case cases[] = {
+        {'G', "400000N1000000W400000N0993000W393000N0993000W393000N1000000W", 4326,
+         {{-100, 40}, {-99.5, 40}, {-100, 39.5}}},
+        {'N', "335000004400000335010004400000335010004399000335000004399000", 32633,
+         {{500000, 4400000}, {501000, 4400000}, {500000, 4399000}}},
+        // Zone 00, an unknown form, a first MGRS corner in zone 32's missing
+        // band X: corners (or none) and no code, never metres called degrees.
+        {'N', "005000004400000005010004400000005010004399000005000004399000", 0,
+         {{500000, 4400000}, {501000, 4400000}, {500000, 4399000}}},
+        {'E', "400000N1000000W400000N0993000W393000N0993000W393000N1000000W", 0, {}},
+        {'U', "32XNL000000000033XVL000000000033XVL000000000033XVL0000000000", 0,
+         {{0, 0}, {400000, 9000000}, {400000, 9000000}}},
+        // Across the 180 degree meridian: the east corners keep running east.
+        {'G', "200000N1790000E200000N1790000W200000N1790000W190000N1790000E", 4326,
+         {{179, 20}, {181, 20}, {179, 19}}},
+        // Geocentric latitudes become geodetic.
+        {'C', "325900N0850000E325900N0855803E321457N0855803E321457N0850000E", 4326,
+         {{85, 33.1593159397}, {85.9675, 33.1593159397}, {85, 32.4230942273}}},
+    };
+    for (const Case& c : cases) {
+        NitfImagePlan layout = Rgb(10, 20);
+        layout.ICORDS = c.icords;
+        layout.IGEOLO = c.igeolo;
+        TempFile file(PlainImage(layout), ".ntf");
+        OpenedImage image(Handler(), file.path());
+        ASSERT_TRUE(image.Ready()) << c.igeolo;
+        const RHGeoRef* geoRef = image.handle.geoRef;
+        ASSERT_NE(geoRef, nullptr) << c.igeolo;
+        EXPECT_EQ(geoRef->epsgCode, c.epsg) << c.igeolo;
+        for (int i = 0; i < 3; ++i) {
+            EXPECT_DOUBLE_EQ(geoRef->points[i].column, i == 1 ? 19 : 0);
+            EXPECT_DOUBLE_EQ(geoRef->points[i].row, i == 2 ? 9 : 0);
+            EXPECT_NEAR(geoRef->points[i].worldX, c.points[i][0], 1e-7) << c.igeolo << " point " << i;
+            EXPECT_NEAR(geoRef->points[i].worldY, c.points[i][1], 1e-7) << c.igeolo << " point " << i;
+        }
+    }
 }
 
 TEST(PlainNitfOutcomes, UnservedCompressionCodes)

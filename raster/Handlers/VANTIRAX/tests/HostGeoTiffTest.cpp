@@ -101,6 +101,37 @@ TEST(HostGeoTiff, UtmRgbImageKeepsItsZoneAndMetres)
     EXPECT_EQ(r.gdal.checksums, RawChecksums(r.raw, r.gdal.width, r.gdal.height, 3));
 }
 
+// Corners that name no coordinate system: UTM zone 00 keeps its transform
+// with no coordinate system, ICORDS "E" (zero corners) no georeference;
+// the host says so.
+TEST(HostGeoTiff, CornersWithoutACoordinateSystemAreWrittenWithoutOne)
+{
+    struct Case {
+        const char* zone;
+        char icords;
+        const char* warning;
+        const char* infoText;
+    };
+    const Case cases[] = {
+        {"00", 'N', "written without a coordinate system", "x 500000.000  y 4400000.000"},
+        {"33", 'E', "written without georeference: the georeference's corners span no area", "span no area"},
+    };
+    for (const Case& c : cases) {
+        TempDirectory directory;
+        const std::string input = directory / "image.ntf", tiff = directory / "out.tif";
+        WriteFile(input, UtmRgbImage(c.zone, c.icords));
+        const ProcessResult rendered = RunHost({"render", input, tiff});
+        EXPECT_EQ(rendered.exitCode, 0) << rendered.err;
+        EXPECT_NE(rendered.err.find(c.warning), std::string::npos) << rendered.err;
+        const std::string gdal = RunProgram({"gdalinfo", tiff}).out;
+        EXPECT_EQ(gdal.find("Coordinate System is"), std::string::npos) << gdal;
+        EXPECT_EQ(gdal.find("Origin = (500000.000") != std::string::npos, c.icords == 'N') << gdal;
+        const std::string text = RunHost({"info", input, "--text"}).out;
+        EXPECT_NE(text.find("georef      no coordinate system (EPSG code 0)"), std::string::npos) << text;
+        EXPECT_NE(text.find(c.infoText), std::string::npos) << text;
+    }
+}
+
 TEST(HostGeoTiff, RotatedCornersGiveAFullTransform)
 {
     Rendered r;
@@ -110,6 +141,67 @@ TEST(HostGeoTiff, RotatedCornersGiveAFullTransform)
     EXPECT_NE(r.gdal.geoTransform[4], 0.0);
     ExpectCornersMatch(r, kDegreeTolerance);
     EXPECT_EQ(r.gdal.checksums, RawChecksums(r.raw, r.gdal.width, r.gdal.height, 1));
+}
+
+// Where the host must place an image, and how GDAL places the same file:
+// RPF coverage corners at the outer corners as here, plain NITF IGEOLO
+// corners at the corner pixels' centres.
+struct Placement {
+    std::string name;
+    bool gdalAtPixelCentres;
+    double gdalEastBehind; // how far GDAL's east corners lie west of ours
+    double west, north, east, south;
+};
+
+// The corners the host reads, the GeoTIFF it renders (positive pixel width,
+// the same corners), and GDAL's corners of the file itself.
+void ExpectPlaced(const std::string& path, const Placement& p)
+{
+    SCOPED_TRACE(p.name);
+    Rendered r;
+    Render(ReadWholeFile(path), r);
+    const auto& ours = r.info.points;
+    EXPECT_NEAR(ours[0][2], p.west, 1e-5);
+    EXPECT_NEAR(ours[0][3], p.north, 1e-5);
+    EXPECT_NEAR(ours[1][2], p.east, 1e-5);
+    EXPECT_NEAR(ours[2][3], p.south, 1e-5);
+    EXPECT_GT(r.gdal.geoTransform[1], 0.0);
+    ExpectCornersMatch(r, kDegreeTolerance);
+
+    const GdalReport source = ReadWithGdal(path);
+    ASSERT_TRUE(source.read);
+    const double in = p.gdalAtPixelCentres ? 0.5 : 0.0, w = source.width, h = source.height;
+    EXPECT_NEAR(source.X(in, in), ours[0][2], 1e-6);
+    EXPECT_NEAR(source.Y(in, in), ours[0][3], 1e-6);
+    EXPECT_NEAR(source.X(w - in, in), ours[1][2] - p.gdalEastBehind, 1e-6);
+    EXPECT_NEAR(source.Y(in, h - in), ours[2][3], 1e-6);
+}
+
+TEST(HostGeoTiff, FrameAcross180DegreesIsPlacedAsGdalPlacesIt)
+{
+    RpfCorners corners;
+    corners.northWestLongitude = corners.southWestLongitude = 179.75;
+    corners.northEastLongitude = corners.southEastLongitude = -179.75;
+    TempDirectory directory;
+    WriteFile(directory / "frame.ntf", SmallFrameFile(corners));
+    ExpectPlaced(directory / "frame.ntf", {"fixture frame", false, 0, 179.75, 40, 180.25, 39.5});
+}
+
+TEST(HostGeoTiff, CorpusImagesAcross180DegreesAndInGeocentricLatitudes)
+{
+    const std::string corpus = VX_CORPUS_DIR;
+    if (!std::filesystem::exists(corpus))
+        GTEST_SKIP() << "no corpus at " << corpus;
+    const Placement placements[] = {
+        // A CADRG frame from 173.1E to 170.7W.
+        {"jitc-nitf20/U_3058B.NTF", false, 0, 173.0769231, 62.3076923, 189.32643, 51.9230769},
+        // 160E to 160W: GDAL 3.6 leaves the east corners at -160, mirrored.
+        {"jitc-nitf21/i_3004g.ntf", true, 360, 160, 20, 200, -20},
+        // ICORDS "C": 32d59'00" and 32d14'57" geocentric.
+        {"jitc-nitf20/U_1001A.NTF", true, 0, 85, 33.15932, 85.9675, 32.4230942},
+    };
+    for (const Placement& p : placements)
+        ExpectPlaced(corpus + "/" + p.name, p);
 }
 
 TEST(HostGeoTiff, WindowIsShiftedOnTheSameGrid)

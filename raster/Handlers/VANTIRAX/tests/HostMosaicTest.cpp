@@ -17,11 +17,14 @@ constexpr double kDegreeTolerance = 1e-9;
 constexpr double kFrameDegrees = 0.5;
 constexpr uint32_t kGridSide = 2 * kRpfFrameSide;
 
+// A frame's corners as its coverage section states them: an east edge past
+// 180 degrees is written as its longitude west of Greenwich.
 RpfCorners CornersAt(double west, double north)
 {
+    const double east = west + kFrameDegrees;
     RpfCorners c;
     c.northWestLongitude = c.southWestLongitude = west;
-    c.northEastLongitude = c.southEastLongitude = west + kFrameDegrees;
+    c.northEastLongitude = c.southEastLongitude = east > 180.0 ? east - 360.0 : east;
     c.northWestLatitude = c.northEastLatitude = north;
     c.southWestLatitude = c.southEastLatitude = north - kFrameDegrees;
     return c;
@@ -43,15 +46,16 @@ void WriteBlock(const TempDirectory& in)
 }
 
 // The grid as the frames' dumps say it should be, nodata around them.
-std::string ExpectedGrid(const TempDirectory& in)
+std::string ExpectedGrid(const TempDirectory& in, const std::vector<Placed>& frames = kFrames,
+                         uint32_t gridWidth = kGridSide, uint32_t gridHeight = kGridSide)
 {
-    std::string grid(size_t(kGridSide) * kGridSide, char(kRpfMaskedPixel));
-    for (const Placed& frame : kFrames) {
+    std::string grid(size_t(gridWidth) * gridHeight, char(kRpfMaskedPixel));
+    for (const Placed& frame : frames) {
         const std::string dump = in / (frame.name + ".raw");
         EXPECT_EQ(RunHost({"dump", in / frame.name, dump}).exitCode, 0);
         const std::string pixels = ReadWholeFile(dump);
         for (uint32_t row = 0; row < kRpfFrameSide; ++row)
-            std::memcpy(&grid[size_t(frame.row + row) * kGridSide + frame.column], &pixels[size_t(row) * kRpfFrameSide],
+            std::memcpy(&grid[size_t(frame.row + row) * gridWidth + frame.column], &pixels[size_t(row) * kRpfFrameSide],
                         kRpfFrameSide);
     }
     return grid;
@@ -81,6 +85,28 @@ TEST(HostMosaic, FramesMeetOnOneGridWithNodataAround)
     const std::string raw = out / "expected.raw";
     WriteFile(raw, ExpectedGrid(in));
     EXPECT_EQ(gdal.checksums, RawChecksums(raw, kGridSide, kGridSide, 1));
+}
+
+// Frames on both sides of the 180 degree meridian and one across it: one
+// longitude range, from 179.25 to 180.75 degrees east.
+TEST(HostMosaic, FramesAcross180DegreesStayInOnePiece)
+{
+    TempDirectory in, out;
+    WriteFile(in / "across.ntf", SmallFrameFile(CornersAt(179.75, 40.0)));
+    WriteFile(in / "east.ntf", SmallFrameFile(CornersAt(-179.75, 40.0)));
+    WriteFile(in / "west.ntf", SmallFrameFile(CornersAt(179.25, 40.0)));
+    const std::string mosaic = out / "mosaic.tif";
+    ProcessResult result = RunHost({"mosaic", "-o", mosaic, in.path()});
+    ASSERT_EQ(result.exitCode, 0) << result.err;
+    EXPECT_NE(result.err.find("3 frames on 4608 x 1536 pixels"), std::string::npos) << result.err;
+    const GdalReport gdal = ReadWithGdal(mosaic);
+    EXPECT_NEAR(gdal.X(0, 0), 179.25, kDegreeTolerance);
+    EXPECT_NEAR(gdal.X(gdal.width, 0), 180.75, kDegreeTolerance);
+    const std::vector<Placed> frames = {
+        {"west.ntf", 0, 0}, {"across.ntf", kRpfFrameSide, 0}, {"east.ntf", 2 * kRpfFrameSide, 0}};
+    const std::string raw = out / "expected.raw";
+    WriteFile(raw, ExpectedGrid(in, frames, 3 * kRpfFrameSide, kRpfFrameSide));
+    EXPECT_EQ(gdal.checksums, RawChecksums(raw, 3 * kRpfFrameSide, kRpfFrameSide, 1));
 }
 
 TEST(HostMosaic, OtherCoordinateSystemsAreRefusedAndTheRestPlaced)

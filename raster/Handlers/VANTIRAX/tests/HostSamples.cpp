@@ -15,10 +15,10 @@ uint64_t Pattern(int32_t band, int32_t row, int32_t column)
     return uint64_t(band * 80 + row * 5 + column * 3) & 0xFF;
 }
 
-std::string UtmSlot(double easting, double northing)
+std::string UtmSlot(const char* zone, double easting, double northing)
 {
     char slot[16];
-    std::snprintf(slot, sizeof slot, "33%06.0f%07.0f", easting, northing);
+    std::snprintf(slot, sizeof slot, "%.2s%06.0f%07.0f", zone, easting, northing);
     return slot;
 }
 
@@ -34,7 +34,7 @@ std::string ImageFile(const NitfImagePlan& plan)
     return BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, Pattern)));
 }
 
-NitfImagePlan UtmRgbPlan()
+NitfImagePlan UtmRgbPlan(const char* zone, char icords)
 {
     NitfImagePlan plan;
     plan.rows = kUtmRows;
@@ -42,11 +42,11 @@ NitfImagePlan UtmRgbPlan()
     plan.IREP = "RGB";
     plan.bands = {NitfBandPlan{"R", 0, 0, ""}, NitfBandPlan{"G", 0, 0, ""}, NitfBandPlan{"B", 0, 0, ""}};
     plan.IMODE = 'P';
-    plan.ICORDS = 'N';
+    plan.ICORDS = icords;
     const double east = kUtmWest + kUtmColumns * kUtmPixel;
     const double south = kUtmNorth - kUtmRows * kUtmPixel;
-    plan.IGEOLO = UtmSlot(kUtmWest, kUtmNorth) + UtmSlot(east, kUtmNorth) + UtmSlot(east, south) +
-                  UtmSlot(kUtmWest, south);
+    plan.IGEOLO = UtmSlot(zone, kUtmWest, kUtmNorth) + UtmSlot(zone, east, kUtmNorth) +
+                  UtmSlot(zone, east, south) + UtmSlot(zone, kUtmWest, south);
     return plan;
 }
 
@@ -70,9 +70,9 @@ std::string SmallFrameFile(const RpfCorners& corners)
     return FrameFile(corners, RpfProduct::Cadrg, masked);
 }
 
-std::string UtmRgbImage()
+std::string UtmRgbImage(const char* zone, char icords)
 {
-    return ImageFile(UtmRgbPlan());
+    return ImageFile(UtmRgbPlan(zone, icords));
 }
 
 std::string RotatedGreyImage()

@@ -12,8 +12,9 @@ std::string FrameFile(const RpfCorners& corners = {}, RpfProduct product = RpfPr
                       const std::set<uint32_t>& maskedSubframes = {});
 // A frame with only its first subframe stored: small, quick to write in bulk.
 std::string SmallFrameFile(const RpfCorners& corners = {});
-// A 40 x 30 RGB image with UTM zone 33 north corners (ICORDS "N").
-std::string UtmRgbImage();
+// A 40 x 30 RGB image with UTM north corners (ICORDS "N", or the form given)
+// in the zone given as its two IGEOLO digits.
+std::string UtmRgbImage(const char* zone = "33", char icords = 'N');
 // A 20 x 10 grey image whose decimal-degree corners are rotated (not north up).
 std::string RotatedGreyImage();
 // An RPFHDR file whose RPF sections are missing: recognised, then refused at open.

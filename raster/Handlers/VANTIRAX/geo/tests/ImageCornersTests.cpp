@@ -44,22 +44,57 @@ std::string Igeolo(const char* slot1, const char* slot2, const char* slot4,
     return std::string(slot1) + slot2 + slot3 + slot4;
 }
 
-TEST(ImageCorners, GeographicAndGeocentricAlike)
+TEST(ImageCorners, GeographicAndGeocentric)
 {
     const Corners expected = {85.0, 32.0 + 59.0 / 60.0, 85.0 + 1.0 / 3600.0,
                               32.0 + 59.0 / 60.0, 85.0, 32.0 + (58.0 + 59.0 / 60.0) / 60.0};
-    for (char icords : {'G', 'C'}) {
-        EXPECT_EQ(Read(icords, kGeographicIgeolo), expected) << icords;
+    EXPECT_EQ(Read('G', kGeographicIgeolo), expected);
+    // "C" latitudes are geocentric: the geodetic latitudes of the same points
+    // (GeographicLib's CartConvert of these gives back 32d59'00" and 32d58'59"
+    // geocentric); longitudes stay.
+    const Corners geodetic = Read('C', kGeographicIgeolo);
+    const Corners geodeticExpected = {85.0, 33.1593159397, 85.0 + 1.0 / 3600.0, 33.1593159397, 85.0, 33.1590374062};
+    for (size_t i = 0; i < geodetic.size(); ++i)
+        EXPECT_NEAR(geodetic[i], geodeticExpected[i], 1e-9) << i;
+    for (char icords : {'G', 'C'})
         EXPECT_EQ(Code(icords, kGeographicIgeolo), kGeographic);
-    }
+    const std::string poles = Igeolo("900000N0000000E", "900000S0000000E", "000000N0000000E");
+    EXPECT_EQ(Read('C', poles.c_str()), (Corners{0.0, 90.0, 0.0, -90.0, 0.0, 0.0}));
     // Only upper-case S and W turn the sign.
-    const std::string west = Igeolo("351530N1203015W", "351530s1203015w", "351530S0000000E");
+    const std::string west = Igeolo("351530N0203015W", "351530s0203015w", "351530S0000000E");
     const Corners c = Read('G', west.c_str());
-    EXPECT_NEAR(c[0], -120.504166667, 1e-9);
+    EXPECT_NEAR(c[0], -20.504166667, 1e-9);
     EXPECT_NEAR(c[1], 35.258333333, 1e-9);
-    EXPECT_NEAR(c[2], 120.504166667, 1e-9);
+    EXPECT_NEAR(c[2], 20.504166667, 1e-9);
     EXPECT_NEAR(c[3], 35.258333333, 1e-9);
     EXPECT_NEAR(c[5], -35.258333333, 1e-9);
+}
+
+// Corners within 180 degrees of the first keep their longitude; those across
+// the 180 degree meridian from it move a whole turn, in every degree form.
+TEST(ImageCorners, LongitudesKeepRunningAcross180Degrees)
+{
+    struct Case {
+        char icords;
+        std::string igeolo;
+        Corners expected;
+    };
+    const Case cases[] = {
+        // JITC i_3004g: 160E to 160W.
+        {'G', Igeolo("200000N1600000E", "200000N1600000W", "200000S1600000E"), {160, 20, 200, 20, 160, -20}},
+        // Running west: a turn less.
+        {'D', Igeolo("+10.000-179.500", "+10.000+179.500", "+09.000-179.500"), {-179.5, 10, -180.5, 10, -179.5, 9}},
+        // Rotated a quarter turn: the first corner is the north-east one.
+        {'D', Igeolo("+10.000+179.500", "+09.000+179.500", "+10.000-179.500"), {179.5, 10, 179.5, 9, 180.5, 10}},
+        // South up, and one just 180 degrees wide: as written.
+        {'D', Igeolo("-10.000+020.000", "-10.000+010.000", "+10.000+020.000"), {20, -10, 10, -10, 20, 10}},
+        {'D', Igeolo("+10.000-090.000", "+10.000+090.000", "+09.000-090.000"), {-90, 10, 90, 10, -90, 9}},
+    };
+    for (const Case& c : cases) {
+        const Corners corners = Read(c.icords, c.igeolo.c_str());
+        for (size_t i = 0; i < corners.size(); ++i)
+            EXPECT_NEAR(corners[i], c.expected[i], 1e-9) << c.igeolo << " value " << i;
+    }
 }
 
 TEST(ImageCorners, DecimalDegrees)
@@ -103,6 +138,9 @@ TEST(ImageCorners, MgrsBecomesUtm)
     const std::string refused = Igeolo("31UJQ5248211717", "31UDQ5248211717", "31IDQ5248211717");
     EXPECT_EQ(Read('U', refused.c_str()), (Corners{0.0, 0.0, 452482.0, 5411717.0, 0.0, 0.0}));
     EXPECT_EQ(Code('U', refused.c_str()), 0);
+    // Zone 32 has no band X (Svalbard): no code, whatever the other corners.
+    const std::string svalbard = Igeolo("32XNL0000000000", "33XVL0000000000", "33XVL0000000000");
+    EXPECT_EQ(Code('U', svalbard.c_str()), 0);
 }
 
 TEST(ImageCorners, ThirdSlotIsNeverRead)
@@ -135,7 +173,7 @@ TEST(ImageCorners, ShortIgeoloIsNotReadPastItsEnd)
         const std::string text = "4531311836";
         auto igeolo = std::make_unique<char[]>(text.size() + 1);
         text.copy(igeolo.get(), text.size());
-        EXPECT_EQ(Read(icords, igeolo.get())[4], 0.0) << icords;
+        EXPECT_EQ(Read(icords, igeolo.get())[5], 0.0) << icords;
         Code(icords, igeolo.get());
     }
 }

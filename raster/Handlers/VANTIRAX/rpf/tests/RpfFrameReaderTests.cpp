@@ -10,15 +10,17 @@
 
 namespace {
 
-std::atomic<size_t> allocationCount{0};
+std::atomic<size_t> allocatedBytes{0};
 
 } // namespace
 
-// Counts every allocation of the test program, for the line allocation test.
+// Counts the bytes of every allocation of the test program, for the line
+// allocation and draw width tests.
 void* operator new(size_t size)
 {
-    ++allocationCount;
-    if (void* memory = std::malloc(size ? size : 1))
+    size = size ? size : 1;
+    allocatedBytes += size;
+    if (void* memory = std::malloc(size))
         return memory;
     throw std::bad_alloc();
 }
@@ -97,13 +99,20 @@ TEST(RpfFrameReader, ServesAnyColumnSpanAndRefusesSpansOutsideTheFrame)
     CRpfFrameReader& reader = opened->reader;
     struct Span {
         uint32_t row, first, last;
+        uint32_t drawWidth = 0; // the host's span width, when not last - first + 1
     };
-    // Inside one code, across code and subframe boundaries, one column, whole rows.
-    const Span spans[] = {{5, 1, 10}, {6, 2, 2}, {7, 3, 4}, {8, 0, 3}, {255, 250, 262},
-                          {256, 255, 256}, {1535, 0, 1535}, {1000, 1535, 1535}, {77, 511, 1029}};
+    // Inside one code, across code and subframe boundaries, one column, whole
+    // rows; draws as wide as a host may ask, for which the code buffer still
+    // holds no more than a frame row's codes.
+    const Span spans[] = {{5, 1, 10},       {6, 2, 2},           {7, 3, 4},         {8, 0, 3},
+                          {255, 250, 262},  {256, 255, 256},     {1535, 0, 1535},   {1000, 1535, 1535},
+                          {77, 511, 1029},  {3, 0, 1535, INT32_MAX}, {9, 3, 700, UINT32_MAX}};
+    const size_t frameRowOfCodes = (kRpfFrameSide / 4 + 2) * sizeof(uint16_t);
     for (const Span& span : spans) {
         uint32_t width = span.last - span.first + 1;
-        reader.PrepareDraw(width);
+        const size_t before = allocatedBytes;
+        reader.PrepareDraw(span.drawWidth != 0 ? span.drawWidth : width);
+        EXPECT_LE(allocatedBytes - before, frameRowOfCodes) << "draw width " << span.drawWidth;
         std::vector<uint8_t> line(width + 1, 0xEE);
         ASSERT_TRUE(reader.ReadLine(opened->drawReader, span.row, span.first, span.last, line.data()));
         auto from = expected.begin() + span.row * kRpfFrameSide + span.first;
@@ -132,10 +141,10 @@ TEST(RpfFrameReader, ReadLineAllocatesNothingAfterItsFirstCall)
     std::vector<uint8_t> line(kRpfFrameSide);
     reader.PrepareDraw(kRpfFrameSide);
     ASSERT_TRUE(reader.ReadLine(opened->drawReader, 0, 0, kRpfFrameSide - 1, line.data()));
-    size_t before = allocationCount.load();
+    size_t before = allocatedBytes.load();
     for (uint32_t row = 1; row < kRpfFrameSide; row += 3)
         ASSERT_TRUE(reader.ReadLine(opened->drawReader, row, row % 700, kRpfFrameSide - 1, line.data()));
-    EXPECT_EQ(allocationCount.load(), before);
+    EXPECT_EQ(allocatedBytes.load(), before);
 }
 
 TEST(RpfFrameReader, PaletteTablesOfCadrgAndCib)
