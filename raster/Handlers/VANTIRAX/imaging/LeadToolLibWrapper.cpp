@@ -287,8 +287,12 @@ bool CLeadToolLibWrapper::openJPEGBitmap(CFileReader& reader, uint32_t dataOffse
         (!streamOffsets.empty() && streamOffsets.size() != bitmapCount))
         return false;
     const uint64_t dataEnd = dataLength == 0 ? fileEnd : std::min(fileEnd, uint64_t(dataOffset) + dataLength);
+    // Blocks sharing a stream are refused: each would walk and decode it
+    // again, work out of proportion to the file.
     std::vector<uint32_t> sortedOffsets(streamOffsets);
     std::sort(sortedOffsets.begin(), sortedOffsets.end());
+    if (std::adjacent_find(sortedOffsets.begin(), sortedOffsets.end()) != sortedOffsets.end())
+        return false;
     AllocateBitmaps(library);
     options.maxWidth = blockWidthLimit;
     options.maxHeight = blockHeightLimit;

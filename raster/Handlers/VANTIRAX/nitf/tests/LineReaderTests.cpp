@@ -255,8 +255,12 @@ TEST(LineReader, JpegBlockStreamsAsEncodersWriteThem)
                 records[b] = uint32_t(data.size());
                 data += streams[b];
             }
-            data = BuildMaskTable(records) + data;
             decoded[2].assign(kSide * kSide, 0);
+            std::vector<uint32_t> sharing = records; // two blocks that share one stream are refused
+            sharing[0] = sharing[1];
+            LoadedImage shared(BuildImageFile(plan, BuildMaskTable(sharing) + data));
+            EXPECT_TRUE(shared.Open() && shared.Row(0).empty());
+            data = BuildMaskTable(records) + data;
         }
         LoadedImage loaded(BuildImageFile(plan, data));
         const bool opened = loaded.Open();
