@@ -217,12 +217,13 @@ TEST(LineReader, JpegBlockStreamsAsEncodersWriteThem)
     constexpr uint32_t kSide = 16;
     struct Layout {
         const char* name;
-        bool progressive, thumbnail, fill, masked;
+        bool progressive, restarts, thumbnail, fill, masked;
     };
-    const Layout layouts[] = {{"APP1 holding FF D9, past the 32 KiB read", false, true, false, false},
-                              {"fill bytes before SOI", false, false, true, false},
-                              {"progressive", true, false, false, false},
-                              {"M3, padded, offsets out of order", false, false, false, true}};
+    const Layout layouts[] = {{"APP1 holding FF D9, past the 32 KiB read", false, false, true, false, false},
+                              {"fill bytes before SOI", false, false, false, true, false},
+                              {"progressive", true, false, false, false, false},
+                              {"RSTn within the scan", false, true, false, false, false},
+                              {"M3, padded, offsets out of order", false, false, false, false, true}};
     // An APP1 segment of 40000 bytes, an embedded thumbnail's SOI and EOI at its ends.
     Bytes app1 = {0xFF, 0xE1, 40002 >> 8, 40002 & 0xFF, 0xFF, 0xD8};
     app1.resize(app1.size() + 40000 - 4, 'x');
@@ -233,6 +234,7 @@ TEST(LineReader, JpegBlockStreamsAsEncodersWriteThem)
         for (unsigned b = 0; b < 4; ++b) {
             JpegBlockPlan block;
             block.progressive = layout.progressive;
+            block.restartRows = layout.restarts ? 1 : 0;
             Bytes stream = EncodeJpegBlock(TestPattern(kSide, kSide, 1, b), block);
             if (layout.thumbnail && b == 0)
                 stream.insert(stream.begin() + 2, app1.begin(), app1.end());
