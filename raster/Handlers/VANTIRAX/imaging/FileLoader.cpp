@@ -1,6 +1,8 @@
 #include "imaging/FileLoader.h"
 
 #include "imaging/BitmapKernel.h"
+#include "imaging/JpegMarkers.h"
+
 #include "base/FileCalls.h"
 
 #include <cstdlib>
@@ -14,48 +16,16 @@ namespace {
 constexpr uint32_t kDefaultMaxSide = 65535;
 constexpr uint64_t kDefaultMaxBitmapBytes = uint64_t(1) << 30;
 
-constexpr uint8_t kMarkerPrefix = 0xFF;
-constexpr uint8_t kStartOfImage = 0xD8;
-constexpr uint8_t kEndOfImage = 0xD9;
-constexpr uint8_t kStartOfScan = 0xDA;
-constexpr uint8_t kLosslessFrame = 0xC3;   // SOF3: lossless, Huffman coded
-
-bool IsFrameMarker(uint8_t code)
-{
-    // SOF0 to SOF15 without DHT (C4), JPG (C8) and DAC (CC).
-    return code >= 0xC0 && code <= 0xCF && code != 0xC4 && code != 0xC8 && code != 0xCC;
-}
-
-bool IsStandaloneMarker(uint8_t code)
-{
-    return code == 0x01 || (code >= 0xD0 && code <= 0xD7);
-}
-
-// Walks the marker segments after SOI up to the frame header; the result is
-// the frame marker's code, or 0 when a scan or the end comes first.
+// The code of the stream's frame marker, or 0 when a scan, the end or a
+// break in the marker segments comes first.
 uint8_t FrameMarker(const uint8_t* data, size_t size)
 {
-    size_t at = 2;
-    while (at + 1 < size) {
-        if (data[at] != kMarkerPrefix)
-            return 0;
-        uint8_t code = data[at + 1];
-        if (code == kMarkerPrefix) {    // fill byte before a marker
-            ++at;
-            continue;
-        }
-        if (IsFrameMarker(code))
-            return code;
-        if (code == kStartOfScan || code == kEndOfImage || code == kStartOfImage)
-            return 0;
-        if (IsStandaloneMarker(code)) {
-            at += 2;
-            continue;
-        }
-        if (at + 3 >= size)
-            return 0;
-        at += 2 + ((size_t(data[at + 2]) << 8) | data[at + 3]);
-    }
+    JpegMemoryBytes bytes(data, size);
+    JpegMarkerWalk walk(bytes);
+    JpegSegment segment;
+    while (walk.Next(segment) && segment.code != kStartOfScan)
+        if (IsFrameMarker(segment.code))
+            return segment.code;
     return 0;
 }
 

@@ -29,13 +29,13 @@ void JumpToErrorPath(j_common_ptr decoder)
 void DropMessage(j_common_ptr, int) {}
 void DropOutput(j_common_ptr) {}
 
-// Refuses what NITF JPEG never holds (progressive scans, whose coefficient
-// buffers grow with the frame, and other component counts) and frames the
-// load options do not allow; chooses the colour space of the output.
+// Refuses component counts other than one and three; chooses the colour
+// space of the output. Progressive frames are decoded too: their coefficient
+// buffers grow with the frame, which the load options bound as they bound
+// the bitmap, and are held to max_memory_to_use (there is no backing store:
+// a frame that needs more fails).
 bool AcceptFrame(jpeg_decompress_struct& decoder, uint32_t flags)
 {
-    if (decoder.progressive_mode)
-        return false;
     if (decoder.num_components == kGreyComponents) {
         decoder.out_color_space = JCS_GRAYSCALE;
         return true;

@@ -1,8 +1,10 @@
 #include "imaging/LeadToolLibWrapper.h"
 
+#include "imaging/JpegMarkers.h"
 #include "imaging/NitfJpegDefaults.h"
 #include "base/ByteOrder.h"
 
+#include <algorithm>
 #include <cstring>
 #include <memory>
 #include <new>
@@ -15,12 +17,7 @@ const char* const kOutOfMemoryText = "CLeadToolLibWrapper::openJPEGBitmap. Not e
 
 namespace {
 
-constexpr uint8_t kMarkerPrefix = 0xFF;
-constexpr uint8_t kStartOfImage = 0xD8;
-constexpr uint8_t kEndOfImage = 0xD9;
 constexpr uint8_t kApp6 = 0xE6;
-constexpr uint8_t kDefineHuffmanTables = 0xC4;
-constexpr uint8_t kDefineQuantisationTables = 0xDB;
 constexpr uint32_t kScanChunkSize = 32 * 1024; // one read per chunk: a stream costs few system calls
 constexpr uint32_t kLargestReaderOffset = 0x7FFFFFFF;   // CFileReader seeks take 32-bit signed offsets
 
@@ -43,63 +40,6 @@ bool IsUnservedDepth(uint32_t NBPP)
     return NBPP == 12 || NBPP == 16;
 }
 
-// Walks the FF xx pairs of the file from a start offset, reading a chunk
-// at a time. Segment payloads are not skipped: every pair counts. The scan
-// ends at a short read, after the bytes that read did deliver.
-struct MarkerScanner {
-    CFileReader& reader;
-    uint32_t start;
-    uint32_t chunkStart = 0;    // distance of chunk[0] from start
-    uint32_t chunkLength = 0;
-    uint32_t index = 0;
-    bool lastChunk = false;
-    uint8_t chunk[kScanChunkSize] = {};
-
-    MarkerScanner(CFileReader& fileReader, uint32_t startOffset) : reader(fileReader), start(startOffset) {}
-
-    // The next pair: the byte after the FF, and the FF's distance from start.
-    bool Next(uint8_t& code, uint32_t& distance)
-    {
-        for (;;) {
-            for (; index + 1 < chunkLength; ++index) {
-                if (chunk[index] == kMarkerPrefix) {
-                    code = chunk[index + 1];
-                    distance = chunkStart + index++;
-                    return true;
-                }
-            }
-            if (lastChunk)
-                return false;
-            Refill();
-        }
-    }
-
-    // An FF in the chunk's last byte is read again as the next chunk's first,
-    // so that its pair is seen whole.
-    void Refill()
-    {
-        bool keepLast = chunkLength > 0 && chunk[chunkLength - 1] == kMarkerPrefix;
-        chunkStart += keepLast ? chunkLength - 1 : chunkLength;
-        index = 0;
-        chunkLength = 0;
-        uint64_t at = uint64_t(start) + chunkStart;
-        if (at > kLargestReaderOffset || !reader.HoldsFile() || reader.error == kSeekFailed) {
-            lastChunk = true;
-            return;
-        }
-        reader.SeekTo(static_cast<int32_t>(at), kSeekSet);
-        reader.ReadBytes(chunk, kScanChunkSize);
-        if (reader.error == kSeekFailed) {
-            lastChunk = true;
-            return;
-        }
-        chunkLength = static_cast<uint32_t>(reader.position - at);
-        // Reaching the end of the file ends the scan; it is no read failure.
-        lastChunk = reader.endOfFile != 0;
-        reader.endOfFile = 0;
-    }
-};
-
 void ClearReadFailure(CFileReader& reader)
 {
     reader.error = 0;
@@ -113,6 +53,98 @@ bool SeekAndRead(CFileReader& reader, uint64_t offset, void* buffer, uint32_t co
     reader.SeekTo(static_cast<int32_t>(offset), kSeekSet);
     reader.ReadBytes(buffer, count);
     return !reader.Failed();
+}
+
+// The end of what CFileReader can reach of the file.
+uint64_t ReadableEnd(const CFileReader& reader)
+{
+    return std::min<uint64_t>(reader.FileSize(), uint64_t(kLargestReaderOffset) + 1);
+}
+
+// A stretch of the file as the marker walk sees it, read a chunk at a time.
+class FileStreamBytes : public JpegBytes {
+public:
+    FileStreamBytes(CFileReader& fileReader, uint64_t startOffset, uint64_t byteCount)
+        : reader(fileReader), start(startOffset), size(byteCount)
+    {
+    }
+    uint64_t Size() const override { return size; }
+    const uint8_t* Window(uint64_t at, size_t& count) override
+    {
+        count = size_t(std::min<uint64_t>(kScanChunkSize, size - at));
+        if (!SeekAndRead(reader, start + at, chunk, uint32_t(count))) {
+            ClearReadFailure(reader);
+            return nullptr;
+        }
+        return chunk;
+    }
+
+private:
+    CFileReader& reader;
+    const uint64_t start;
+    const uint64_t size;
+    uint8_t chunk[kScanChunkSize] = {};
+};
+
+struct StreamPlace {
+    uint64_t offset;    // of its SOI
+    uint32_t length;    // to the end of its EOI
+};
+
+// The stream that starts at `start`, after any fill bytes, walked segment by
+// segment; it must end with EOI before `end`.
+bool LocateStream(CFileReader& reader, uint64_t start, uint64_t end, StreamPlace& place)
+{
+    if (start >= end)
+        return false;
+    FileStreamBytes bytes(reader, start, end - start);
+    JpegMarkerWalk walk(bytes);
+    JpegSegment segment;
+    if (!walk.Next(segment))
+        return false;
+    const uint64_t first = segment.marker;
+    while (walk.Next(segment)) {
+    }
+    const uint64_t length = segment.marker + 2 - first;
+    if (!walk.Complete() || length > UINT32_MAX)
+        return false;
+    place = StreamPlace {start + first, static_cast<uint32_t>(length)};
+    return true;
+}
+
+// A masked image's stream ends where the stored block next in offset order
+// begins, or at the end of the image data.
+uint64_t MaskedStreamEnd(const std::vector<uint32_t>& sortedOffsets, uint32_t offset, uint64_t dataOffset,
+                         uint64_t dataEnd)
+{
+    auto following = std::upper_bound(sortedOffsets.begin(), sortedOffsets.end(), offset);
+    return following == sortedOffsets.end() ? dataEnd : std::min(dataEnd, dataOffset + *following);
+}
+
+// The DQT and DHT segments a stream holds before its first scan, and where
+// missing ones go: before the frame header.
+struct TablePlace {
+    bool hasDht = false;
+    bool hasDqt = false;
+    bool framed = false;
+    size_t insertAt = 0;
+};
+
+TablePlace FindTables(const uint8_t* stream, size_t size)
+{
+    TablePlace tables;
+    JpegMemoryBytes bytes(stream, size);
+    JpegMarkerWalk walk(bytes);
+    JpegSegment segment;
+    while (walk.Next(segment) && segment.code != kStartOfScan) {
+        tables.hasDht = tables.hasDht || segment.code == kDefineHuffmanTables;
+        tables.hasDqt = tables.hasDqt || segment.code == kDefineQuantisationTables;
+        if (!tables.framed && IsFrameMarker(segment.code)) {
+            tables.framed = true;
+            tables.insertAt = size_t(segment.marker);
+        }
+    }
+    return tables;
 }
 
 void ToHostOrder16(uint8_t* field)
@@ -181,14 +213,8 @@ bool CLeadToolLibWrapper::PrepareBiLevel()
 
 bool CLeadToolLibWrapper::PrepareJpeg(CFileReader& reader, uint32_t dataOffset, uint32_t /*LI*/, uint32_t NBPP)
 {
-    static const uint8_t kNitfJpegStart[4] = {kMarkerPrefix, kStartOfImage, kMarkerPrefix, kApp6};
-    uint8_t start[4] = {};
     if (!EnsureLibrary() || IsUnservedDepth(NBPP))
         return false;
-    if (!SeekAndRead(reader, dataOffset, start, sizeof start) || std::memcmp(start, kNitfJpegStart, 4) != 0) {
-        ClearReadFailure(reader);
-        return false;
-    }
     if (!ReadNitfApp6(reader, dataOffset) || std::memcmp(app6 + 4, "NITF", 4) != 0)
         return false;
     kind = kJpegDecoder;
@@ -213,58 +239,27 @@ bool CLeadToolLibWrapper::Open(CFileReader& reader, uint32_t dataOffset, uint32_
         return false;
     blockWidthLimit = blockWidth ? blockWidth : (NCOLS > kLargestNitfBlockSide ? NCOLS : kLargestNitfBlockSide);
     blockHeightLimit = blockHeight ? blockHeight : (NROWS > kLargestNitfBlockSide ? NROWS : kLargestNitfBlockSide);
-    return openJPEGBitmap(reader, dataOffset);
+    return openJPEGBitmap(reader, dataOffset, LI);
 }
 
+// The first segment after the first stream's SOI must be the NITF APP6 segment.
 bool CLeadToolLibWrapper::ReadNitfApp6(CFileReader& reader, uint32_t dataOffset)
 {
-    MarkerScanner scan(reader, dataOffset);
-    uint8_t code = 0;
-    uint32_t distance = 0;
-    bool found = false;
-    while (!found && scan.Next(code, distance))
-        found = code == kApp6;
-    if (!found || !SeekAndRead(reader, uint64_t(dataOffset) + distance, app6, kApp6Size)) {
+    const uint64_t fileEnd = ReadableEnd(reader);
+    if (dataOffset >= fileEnd)
+        return false;
+    FileStreamBytes bytes(reader, dataOffset, fileEnd - dataOffset);
+    JpegMarkerWalk walk(bytes);
+    JpegSegment segment;
+    const bool found =
+        walk.Next(segment) && walk.Next(segment) && segment.code == kApp6 && segment.length + 4 >= kApp6Size;
+    if (!found || !SeekAndRead(reader, uint64_t(dataOffset) + segment.marker, app6, kApp6Size)) {
         ClearReadFailure(reader);
         return false;
     }
     for (unsigned field : {0u, 2u, 12u, 14u})
         ToHostOrder16(app6 + field);
     return true;
-}
-
-bool CLeadToolLibWrapper::FindEndOfImage(CFileReader& reader, uint32_t start, uint32_t& length)
-{
-    MarkerScanner scan(reader, start);
-    uint8_t code = 0;
-    uint32_t distance = 0;
-    while (scan.Next(code, distance)) {
-        if (code == kEndOfImage) {
-            length = distance + 2;
-            return true;
-        }
-    }
-    return false;
-}
-
-bool CLeadToolLibWrapper::ScanTableMarkers(CFileReader& reader, uint32_t start, bool& hasDht, bool& hasDqt,
-                                           uint32_t& insertionPoint)
-{
-    MarkerScanner scan(reader, start);
-    uint8_t code = 0;
-    uint32_t distance = 0;
-    hasDht = hasDqt = false;
-    while (scan.Next(code, distance)) {
-        hasDht = hasDht || code == kDefineHuffmanTables;
-        hasDqt = hasDqt || code == kDefineQuantisationTables;
-        // SOF0, SOF1, RSTn, EOI, SOS, DRI: the tables must stand before these.
-        if (code == 0xC0 || code == 0xC1 || (code >= 0xD0 && code <= 0xD7) || code == kEndOfImage || code == 0xDA ||
-            code == 0xDD) {
-            insertionPoint = distance;
-            return true;
-        }
-    }
-    return false;
 }
 
 void CLeadToolLibWrapper::AllocateBitmaps(const ImagingBinding& library)
@@ -278,7 +273,7 @@ void CLeadToolLibWrapper::AllocateBitmaps(const ImagingBinding& library)
     }
 }
 
-bool CLeadToolLibWrapper::openJPEGBitmap(CFileReader& reader, uint32_t dataOffset)
+bool CLeadToolLibWrapper::openJPEGBitmap(CFileReader& reader, uint32_t dataOffset, uint32_t dataLength)
 {
     ImagingBinding library {};
     LOADFILEOPTION options {};
@@ -287,26 +282,42 @@ bool CLeadToolLibWrapper::openJPEGBitmap(CFileReader& reader, uint32_t dataOffse
     library.L_GetDefaultLoadFileOption(&options, sizeof options);
     if (bitmaps != nullptr)
         throw std::runtime_error(kReinitialisedText);
-    uint64_t fileSize = reader.FileSize();
-    if (bitmapCount == 0 || dataOffset >= fileSize || bitmapCount > (fileSize - dataOffset) / kSmallestJpegStream)
+    const uint64_t fileEnd = ReadableEnd(reader);
+    if (bitmapCount == 0 || dataOffset >= fileEnd || bitmapCount > (fileEnd - dataOffset) / kSmallestJpegStream ||
+        (!streamOffsets.empty() && streamOffsets.size() != bitmapCount))
+        return false;
+    const uint64_t dataEnd = dataLength == 0 ? fileEnd : std::min(fileEnd, uint64_t(dataOffset) + dataLength);
+    // Blocks sharing a stream are refused: each would walk and decode it
+    // again, work out of proportion to the file.
+    std::vector<uint32_t> sortedOffsets(streamOffsets);
+    std::sort(sortedOffsets.begin(), sortedOffsets.end());
+    if (std::adjacent_find(sortedOffsets.begin(), sortedOffsets.end()) != sortedOffsets.end())
         return false;
     AllocateBitmaps(library);
     options.maxWidth = blockWidthLimit;
     options.maxHeight = blockHeightLimit;
     uint64_t imageBytes = 0;
-    uint32_t offset = dataOffset;
+    const bool placed = !streamOffsets.empty();
+    uint64_t next = dataOffset;   // without offsets each stream follows the one before
     for (uint32_t block = 0; block < bitmapCount; ++block) {
-        uint32_t length = 0;
-        if (!FindEndOfImage(reader, offset, length))
+        const uint64_t start = placed ? dataOffset + uint64_t(streamOffsets[block]) : next;
+        const uint64_t end =
+            placed ? MaskedStreamEnd(sortedOffsets, streamOffsets[block], dataOffset, dataEnd) : dataEnd;
+        StreamPlace stream {};
+        if (!LocateStream(reader, start, end, stream))
             throw std::runtime_error(kDamagedImageText);
-        ClearReadFailure(reader);
         options.maxBytes = kMaxImageBytes - imageBytes;
-        if (!LoadBlock(reader, library, block, offset, length, options))
+        if (!LoadBlock(reader, library, block, static_cast<uint32_t>(stream.offset), stream.length, options))
             return false;
         imageBytes += BitmapBytes(bitmaps[block]);
-        offset += length;
+        next = stream.offset + stream.length;
     }
     return true;
+}
+
+uint32_t CLeadToolLibWrapper::LoadFlags() const
+{
+    return streamColor() == kRgbStreamColour ? kLoadFlagsJpeg | kLoadFlagRgbStream : kLoadFlagsJpeg;
 }
 
 // One block's stream, loaded as it stands in the file; a stream the loader
@@ -314,11 +325,10 @@ bool CLeadToolLibWrapper::openJPEGBitmap(CFileReader& reader, uint32_t dataOffse
 bool CLeadToolLibWrapper::LoadBlock(CFileReader& reader, const ImagingBinding& library, uint32_t block,
                                     uint32_t offset, uint32_t length, LOADFILEOPTION& options)
 {
-    uint32_t flags = streamColor() == kRgbStreamColour ? kLoadFlagsJpeg | kLoadFlagRgbStream : kLoadFlagsJpeg;
     FILEINFO info = FreshFileInfo();
     int loaded = library.L_LoadFileOffset(static_cast<int>(reader.handle), offset, length, bitmaps[block],
-                                          sizeof(BITMAPHANDLE), kBitsAsStored, kOrderRgb, flags, nullptr, nullptr,
-                                          &options, &info);
+                                          sizeof(BITMAPHANDLE), kBitsAsStored, kOrderRgb, LoadFlags(), nullptr,
+                                          nullptr, &options, &info);
     if (loaded != kLoadSucceeded && !LoadWithDefaultTables(reader, library, block, offset, length, options, info))
         return false;
     loaderConverted = info.colorConverted != 0 ? 1 : 0;
@@ -329,36 +339,33 @@ bool CLeadToolLibWrapper::LoadWithDefaultTables(CFileReader& reader, const Imagi
                                                 uint32_t offset, uint32_t length, LOADFILEOPTION& options,
                                                 FILEINFO& info)
 {
-    bool hasDht = false, hasDqt = false;
-    uint32_t insertAt = 0;
-    bool scanned = ScanTableMarkers(reader, offset, hasDht, hasDqt, insertAt);
-    ClearReadFailure(reader);
-    if (!scanned || insertAt >= length || (hasDht && hasDqt))
+    const uint64_t room = uint64_t(length) + kDqtSegmentSize + kDhtSegmentSize;
+    if (room > UINT32_MAX)
         return false;
-    // Quality 1 to 5 selects a default DQT; other values have none.
-    uint8_t q = quality();
-    if (!hasDqt && (q < 1 || q > kDefaultQualities))
-        return false;
-    uint32_t dqtSize = hasDqt ? 0 : kDqtSegmentSize;
-    uint32_t dhtSize = hasDht ? 0 : kDhtSegmentSize;
-    uint64_t total = uint64_t(length) + dqtSize + dhtSize;
-    if (total > UINT32_MAX)
-        return false;
-    std::unique_ptr<uint8_t[]> stream(new (std::nothrow) uint8_t[total]);
+    std::unique_ptr<uint8_t[]> stream(new (std::nothrow) uint8_t[room]);
     if (!stream)
         throw std::runtime_error(kOutOfMemoryText);
-    uint8_t* tables = stream.get() + insertAt;
-    if (dqtSize)
-        std::memcpy(tables, kDefaultDqt[q - 1], dqtSize);
-    if (dhtSize)
-        std::memcpy(tables + dqtSize, kDefaultDht, dhtSize);
-    if (!SeekAndRead(reader, offset, stream.get(), insertAt) ||
-        !SeekAndRead(reader, uint64_t(offset) + insertAt, tables + dqtSize + dhtSize, length - insertAt))
+    if (!SeekAndRead(reader, offset, stream.get(), length)) {
+        ClearReadFailure(reader);
         return false;
+    }
+    const TablePlace tables = FindTables(stream.get(), length);
+    // Quality 1 to 5 selects a default DQT; other values have none.
+    const uint8_t q = quality();
+    if (!tables.framed || (tables.hasDht && tables.hasDqt) || (!tables.hasDqt && (q < 1 || q > kDefaultQualities)))
+        return false;
+    const uint32_t dqtSize = tables.hasDqt ? 0 : kDqtSegmentSize;
+    const uint32_t dhtSize = tables.hasDht ? 0 : kDhtSegmentSize;
+    uint8_t* insertion = stream.get() + tables.insertAt;
+    std::memmove(insertion + dqtSize + dhtSize, insertion, length - tables.insertAt);
+    if (dqtSize)
+        std::memcpy(insertion, kDefaultDqt[q - 1], dqtSize);
+    if (dhtSize)
+        std::memcpy(insertion + dqtSize, kDefaultDht, dhtSize);
     info = FreshFileInfo();
-    uint32_t flags = streamColor() == kRgbStreamColour ? kLoadFlagsJpeg | kLoadFlagRgbStream : kLoadFlagsJpeg;
-    return library.L_LoadMemory(stream.get(), bitmaps[block], sizeof(BITMAPHANDLE), kBitsAsStored, kOrderRgb, flags,
-                                nullptr, nullptr, static_cast<uint32_t>(total), &options, &info) == kLoadSucceeded;
+    return library.L_LoadMemory(stream.get(), bitmaps[block], sizeof(BITMAPHANDLE), kBitsAsStored, kOrderRgb,
+                                LoadFlags(), nullptr, nullptr, length + dqtSize + dhtSize, &options,
+                                &info) == kLoadSucceeded;
 }
 
 bool CLeadToolLibWrapper::openBiLevelBitmap(CFileReader& reader, uint32_t dataOffset, uint32_t LI, uint32_t NCOLS,

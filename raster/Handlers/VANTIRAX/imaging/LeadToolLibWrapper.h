@@ -1,7 +1,9 @@
 // CLeadToolLibWrapper: decodes the compressed image data of one NITF image
 // segment into bitmaps held in memory, and hands out row spans of them.
 //  - JPEG (IC "C3", "C5", "I1"): one JPEG stream per block, in block order,
-//    led by the NITF APP6 segment. A stream that leaves out its DQT or DHT
+//    led by the NITF APP6 segment; masked JPEG ("M3", "M5"): one stream per
+//    stored block, wherever the mask table places it. Streams are found by
+//    walking their marker segments. A stream that leaves out its DQT or DHT
 //    gets the NITF defaults, chosen by the APP6 quality byte.
 //  - Bi-level (IC "C1"): one CCITT T.4 strip for the whole image, decoded
 //    after wrapping it in a fixed TIFF header.
@@ -13,6 +15,7 @@
 #include "base/FileReader.h"
 
 #include <cstdint>
+#include <vector>
 
 constexpr unsigned kApp6Size = 27;          // the NITF APP6 segment from its marker on
 constexpr unsigned kTiffHeaderSize = 424;   // the bi-level TIFF wrapper; the strip follows it
@@ -33,6 +36,9 @@ public:
     uint8_t loaderConverted = 0;        // the loader delivered the last block's colours as R,G,B
     uint8_t app6[kApp6Size] = {};       // 2-byte fields at 0, 2, 12, 14 in host order
     uint8_t tiffHeader[kTiffHeaderSize];
+    // Masked JPEG: where each bitmap's stream starts, counted from the data
+    // offset that Open is given. Empty: the streams follow one another from there.
+    std::vector<uint32_t> streamOffsets;
 
     CLeadToolLibWrapper();
     ~CLeadToolLibWrapper();
@@ -41,11 +47,14 @@ public:
 
     // Binds the imaging library; when bound the decoder becomes a bi-level decoder.
     bool PrepareBiLevel();
-    // The data must begin with SOI and the NITF APP6 segment; NBPP 12 and 16 are refused.
+    // The data must begin with SOI (fill bytes may lead it) and the NITF APP6
+    // segment; NBPP 12 and 16 are refused.
     bool PrepareJpeg(CFileReader& reader, uint32_t dataOffset, uint32_t LI, uint32_t NBPP);
-    // Decodes every block. blockWidth and blockHeight (NPPBH, NPPBV) bound the
-    // size a block's stream may declare; 0 means not known, and the bound is
-    // then the largest block NITF allows for an image of NCOLS x NROWS.
+    // Decodes every block. JPEG streams lie within the LI bytes from
+    // dataOffset (LI 0: up to the end of the file). blockWidth and
+    // blockHeight (NPPBH, NPPBV) bound the size a block's stream may declare;
+    // 0 means not known, and the bound is then the largest block NITF allows
+    // for an image of NCOLS x NROWS.
     bool Open(CFileReader& reader, uint32_t dataOffset, uint32_t blockCount, uint32_t LI, uint32_t NBPP,
               uint32_t NBANDS, uint32_t NCOLS, uint32_t NROWS, bool oneDimensional,
               uint32_t blockWidth = 0, uint32_t blockHeight = 0);
@@ -57,13 +66,7 @@ public:
     void FreeBitmaps();
 
     bool ReadNitfApp6(CFileReader& reader, uint32_t dataOffset);
-    // length runs from start to the end of the first FF D9 (EOI) after it.
-    bool FindEndOfImage(CFileReader& reader, uint32_t start, uint32_t& length);
-    // Notes DHT and DQT segments before the frame header or scan; the
-    // insertion point is the distance from start of the marker that ends the scan.
-    bool ScanTableMarkers(CFileReader& reader, uint32_t start, bool& hasDht, bool& hasDqt,
-                          uint32_t& insertionPoint);
-    bool openJPEGBitmap(CFileReader& reader, uint32_t dataOffset);
+    bool openJPEGBitmap(CFileReader& reader, uint32_t dataOffset, uint32_t dataLength);
     bool openBiLevelBitmap(CFileReader& reader, uint32_t dataOffset, uint32_t LI, uint32_t NCOLS, uint32_t NROWS,
                            bool oneDimensional);
 
@@ -78,6 +81,7 @@ private:
     L_FreeBitmapFunction freeBitmap = nullptr;  // the kernel that allocated `bitmaps`
 
     void AllocateBitmaps(const ImagingBinding& library);
+    uint32_t LoadFlags() const;
     bool LoadBlock(CFileReader& reader, const ImagingBinding& library, uint32_t block, uint32_t offset,
                    uint32_t length, LOADFILEOPTION& options);
     bool LoadWithDefaultTables(CFileReader& reader, const ImagingBinding& library, uint32_t block, uint32_t offset,

@@ -5,19 +5,11 @@
 // restart intervals of whole rows.
 #include "imaging/BitmapKernel.h"
 #include "imaging/FileLoader.h"
+#include "imaging/JpegMarkers.h"
 
 #include <cstring>
 
 namespace {
-
-constexpr uint8_t kMarkerPrefix = 0xFF;
-constexpr uint8_t kDefineHuffmanTables = 0xC4;
-constexpr uint8_t kLosslessFrame = 0xC3;
-constexpr uint8_t kStartOfScan = 0xDA;
-constexpr uint8_t kEndOfImage = 0xD9;
-constexpr uint8_t kDefineRestartInterval = 0xDD;
-constexpr uint8_t kFirstRestart = 0xD0;
-constexpr uint8_t kLastRestart = 0xD7;
 
 constexpr unsigned kMaxCodeLength = 16;
 constexpr unsigned kTableSlots = 4;
@@ -92,8 +84,7 @@ struct BitReader {
         bitsLeft = 0;
         while (at + 1 < size && data[at] == kMarkerPrefix && data[at + 1] == kMarkerPrefix)
             ++at;
-        if (at + 1 >= size || data[at] != kMarkerPrefix || data[at + 1] < kFirstRestart ||
-            data[at + 1] > kLastRestart)
+        if (at + 1 >= size || data[at] != kMarkerPrefix || !IsRestartMarker(data[at + 1]))
             return false;
         at += 2;
         return true;
@@ -286,64 +277,35 @@ bool DecodeScan(BitReader& bits, const LosslessState& state, const LosslessScan&
     return !bits.overrun;
 }
 
-// After a scan's entropy data: the position of the next marker that is
-// neither a stuffed 0xFF nor a restart marker.
-size_t SkipEntropyData(const uint8_t* data, size_t size, size_t at)
-{
-    while (at + 1 < size) {
-        if (data[at] == kMarkerPrefix && data[at + 1] != 0 &&
-            !(data[at + 1] >= kFirstRestart && data[at + 1] <= kLastRestart))
-            return at;
-        ++at;
-    }
-    return size;
-}
-
 }  // namespace
 
 bool LoadLosslessJpegStream(const LoadRequest& request)
 {
-    const uint8_t* data = request.data;
-    const size_t size = request.size;
+    JpegMemoryBytes bytes(request.data, request.size);
+    JpegMarkerWalk walk(bytes);
+    JpegSegment marker;
     LosslessState state {};
     bool decodedScan = false;
-    size_t at = 2;
-    while (at + 1 < size) {
-        if (data[at] != kMarkerPrefix)
-            return false;
-        uint8_t code = data[at + 1];
-        if (code == kMarkerPrefix) {
-            ++at;
-            continue;
-        }
-        if (code == kEndOfImage)
-            break;
-        if (at + 3 >= size)
-            return false;
-        size_t length = Read16(data + at + 2);
-        if (length < 2 || length > size - at - 2)
-            return false;
-        const uint8_t* segment = data + at + 4;
-        size_t payload = length - 2;
-        at += 2 + length;
+    while (walk.Next(marker)) {
+        const uint8_t* segment = request.data + marker.payload;
+        const size_t payload = size_t(marker.length);
         bool good = true;
-        if (code == kDefineHuffmanTables) {
+        if (marker.code == kDefineHuffmanTables) {
             good = ReadHuffmanTables(segment, payload, state);
-        } else if (code == kDefineRestartInterval) {
+        } else if (marker.code == kDefineRestartInterval) {
             good = payload == 2;
             state.restartInterval = good ? Read16(segment) : 0;
-        } else if (code == kLosslessFrame) {
+        } else if (marker.code == kLosslessFrame) {
             good = ReadFrame(segment, payload, *request.options, request.bitmap, state);
-        } else if (code == kStartOfScan) {
+        } else if (marker.code == kStartOfScan) {
             LosslessScan scan {};
-            BitReader bits {data, size, at, 0, 0, false};
+            BitReader bits {request.data, request.size, size_t(marker.payload) + payload, 0, 0, false};
             good = ReadScanHeader(segment, payload, state, scan) && DecodeScan(bits, state, scan, request.bitmap);
-            at = SkipEntropyData(data, size, bits.at);
             decodedScan = good;
         }
         if (!good)
             return false;
     }
     request.info->colorConverted = state.frame.componentCount == kMaxComponents ? 1 : 0;
-    return decodedScan;
+    return decodedScan && walk.Complete();
 }

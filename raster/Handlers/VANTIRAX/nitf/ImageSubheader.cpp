@@ -88,7 +88,7 @@ void CNitfImage::ClearParsed()
     compressionKind = kUncompressed;
     FreeVector(blockOffsets);
     FreeVector(streamIndex);
-    streamStart = 0;
+    maskTableLength = 0;
     storedBlockCount = 0;
     std::memset(subheaderText, 0, sizeof subheaderText);
     IGEOLO.reset();
@@ -254,6 +254,7 @@ bool CNitfImage::ReadMaskTable(SubheaderCursor& cursor)
     if (blockedData > uint64_t(INT32_MAX))
         return false;
     dataOffset = static_cast<uint32_t>(blockedData);
+    maskTableLength = IMDATOFF;
     if (TPXCDLNTH != 0 && !cursor.Skip((TPXCDLNTH - 1) / 8 + 1))
         return false;
     if (BMRLNTH == 0) {

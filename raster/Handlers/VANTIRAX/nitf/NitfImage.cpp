@@ -164,44 +164,41 @@ bool CNitfImage::DataFitsFile() const
 bool CNitfImage::PrepareJpegData(CFileReader& reader, uint32_t dataLength)
 {
     const int64_t bits = int64_t(NBPP) * NBANDS;
-    if (bits != 8 && bits != 24)
+    if ((bits != 8 && bits != 24) || dataLength <= maskTableLength)
         return false;
     const uint64_t blocks = uint64_t(NBPR) * uint64_t(NBPC);
     if (blocks > (readLimit - dataOffset) / kSmallestJpegStream)
         return false;
-    streamStart = dataOffset;
     storedBlockCount = static_cast<uint32_t>(blocks);
+    FreeVector(decoder.streamOffsets);
     if (isMasked && !IndexMaskedStreams())
         return false;
-    return decoder.PrepareJpeg(reader, streamStart, dataLength, uint32_t(NBPP));
+    const uint32_t firstStream = isMasked ? dataOffset + decoder.streamOffsets[0] : dataOffset;
+    return decoder.PrepareJpeg(reader, firstStream, dataLength, uint32_t(NBPP));
 }
 
-// A masked JPEG image stores only some blocks, each its own stream, in block
-// order one after another; the decoder reads them from the first one on, so
-// block b is the decoder's bitmap of its rank among the stored blocks.
+// A masked JPEG image stores only some blocks, each its own stream, where
+// the mask table's block records place them: in any order, with any bytes
+// between them. Block b is the decoder's bitmap of its rank among the stored
+// blocks in block order.
 bool CNitfImage::IndexMaskedStreams()
 {
     const size_t blocks = size_t(NBPR) * size_t(NBPC);
     if (blockOffsets.size() < blocks)
         return false;
     streamIndex.assign(blocks, kBlockNotStored);
-    uint32_t stored = 0;
-    uint32_t previous = 0;
+    std::vector<uint32_t>& offsets = decoder.streamOffsets;
     for (size_t b = 0; b < blocks; ++b) {
         const uint32_t blockOffset = blockOffsets[b];
         if (blockOffset == kBlockNotStored)
             continue;
-        if (stored > 0 && blockOffset <= previous)
-            return false;
-        if (stored == 0)
-            streamStart = dataOffset + blockOffset;
         if (uint64_t(dataOffset) + blockOffset >= readLimit)
             return false;
-        streamIndex[b] = stored++;
-        previous = blockOffset;
+        streamIndex[b] = static_cast<uint32_t>(offsets.size());
+        offsets.push_back(blockOffset);
     }
-    storedBlockCount = stored;
-    return stored > 0;
+    storedBlockCount = static_cast<uint32_t>(offsets.size());
+    return storedBlockCount > 0;
 }
 
 void CNitfImage::AllocLineBuffer()
@@ -221,10 +218,11 @@ bool CNitfImage::OpenCompressed(CFileReader& reader, uint32_t dataLength)
         return true;
     if (!isPrepared)
         return false;
-    const uint32_t start = jpeg ? streamStart : dataOffset;
     const uint32_t blocks = jpeg ? storedBlockCount : uint32_t(NBPR) * uint32_t(NBPC);
-    const uint32_t length = static_cast<uint32_t>(std::min<uint64_t>(dataLength, readLimit - start));
-    return decoder.Open(reader, start, blocks, length, uint32_t(NBPP), uint32_t(NBANDS), uint32_t(NCOLS),
+    // The mask table counts in LI: the blocks end where the image data ends.
+    const uint32_t blockedLength = dataLength > maskTableLength ? dataLength - maskTableLength : 0;
+    const uint32_t length = static_cast<uint32_t>(std::min<uint64_t>(blockedLength, readLimit - dataOffset));
+    return decoder.Open(reader, dataOffset, blocks, length, uint32_t(NBPP), uint32_t(NBANDS), uint32_t(NCOLS),
                         uint32_t(NROWS), COMRAT[0] == '1', uint32_t(NPPBH), uint32_t(NPPBV));
 }
 

@@ -110,7 +110,7 @@ private:
 
     uint8_t isPrepared = 0;          // PrepareData accepted the image
     uint64_t readLimit = 0;          // bytes of the file that reads may reach
-    uint32_t streamStart = 0;        // JPEG: the first stored block's stream
+    uint32_t maskTableLength = 0;    // IMDATOFF: bytes of LI before the blocked data
     uint32_t storedBlockCount = 0;   // JPEG: streams the decoder holds
     std::vector<uint32_t> streamIndex; // masked JPEG: decoder bitmap of each block
     // Strips of rows of the uncompressed blocks being read, one slot per block

@@ -75,10 +75,11 @@ TEST(MemoryLimits, BiLevelImageWhoseDecoderWouldNeedOverAQuarterGibibyteIsNotDec
     ExpectOpensSmallAndRowsFail(WideBiLevelFile(17000000), 17000000);
 }
 
-std::string JpegImageFile(uint32_t streamSide)
+std::string JpegImageFile(uint32_t streamSide, bool progressive)
 {
     JpegBlockPlan block;
     block.width = block.height = streamSide;
+    block.progressive = progressive;
     const Bytes stream = EncodeJpegBlock(Bytes(size_t(streamSide) * streamSide, 0x80), block);
     NitfImagePlan plan;
     plan.columns = plan.rows = 16;
@@ -91,14 +92,17 @@ std::string JpegImageFile(uint32_t streamSide)
 TEST(MemoryLimits, JpegStreamLargerThanItsBlockIsNotDecoded)
 {
     const HandlerExports& rh = LoadHandler(VX_HANDLER_PATH);
-    TempFile fitting(JpegImageFile(16), ".ntf");
-    OpenedImage image(rh, fitting.path());
-    std::vector<uint8_t> pixels;
-    uint32_t failedRows = 0;
-    ASSERT_TRUE(image.Ready() && image.DrawAll(pixels, failedRows));
-    ASSERT_EQ(failedRows, 0u);
-    // The same block whose stream declares 4096 x 4096 pixels.
-    ExpectOpensSmallAndRowsFail(JpegImageFile(4096), 16);
+    // Progressive streams need coefficient buffers as large as the frame.
+    for (bool progressive : {false, true}) {
+        TempFile fitting(JpegImageFile(16, progressive), ".ntf");
+        OpenedImage image(rh, fitting.path());
+        std::vector<uint8_t> pixels;
+        uint32_t failedRows = 0;
+        ASSERT_TRUE(image.Ready() && image.DrawAll(pixels, failedRows));
+        ASSERT_EQ(failedRows, 0u) << progressive;
+        // The same block whose stream declares 4096 x 4096 pixels.
+        ExpectOpensSmallAndRowsFail(JpegImageFile(4096, progressive), 16);
+    }
 }
 
 } // namespace

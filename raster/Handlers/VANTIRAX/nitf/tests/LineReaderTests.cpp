@@ -1,4 +1,5 @@
 #include "nitf/tests/NitfTestFile.h"
+#include "tests/fixtures/JpegBlockWriter.h"
 #include "tests/fixtures/NitfImageWriter.h"
 
 #include <gtest/gtest.h>
@@ -207,6 +208,75 @@ TEST(LineReader, CompressedKindsWithoutDecodableDataFailTheirRows)
     LoadedImage vq(BuildImageFile(plan, std::string(16, '\0')));
     ASSERT_TRUE(vq.Open()); // served, as the file declares it, but no row decodes
     EXPECT_TRUE(vq.Row(0).empty());
+}
+
+// JPEG block streams as encoders write them, found by walking their marker
+// segments: 2 x 2 blocks of 16 x 16 that must draw as libjpeg decodes each.
+TEST(LineReader, JpegBlockStreamsAsEncodersWriteThem)
+{
+    constexpr uint32_t kSide = 16;
+    struct Layout {
+        const char* name;
+        bool progressive, restarts, thumbnail, fill, masked;
+    };
+    const Layout layouts[] = {{"APP1 holding FF D9, past the 32 KiB read", false, false, true, false, false},
+                              {"fill bytes before SOI", false, false, false, true, false},
+                              {"progressive", true, false, false, false, false},
+                              {"RSTn within the scan", false, true, false, false, false},
+                              {"M3, padded, offsets out of order", false, false, false, false, true}};
+    // An APP1 segment of 40000 bytes, an embedded thumbnail's SOI and EOI at its ends.
+    Bytes app1 = {0xFF, 0xE1, 40002 >> 8, 40002 & 0xFF, 0xFF, 0xD8};
+    app1.resize(app1.size() + 40000 - 4, 'x');
+    app1.insert(app1.end(), {0xFF, 0xD9});
+    for (const Layout& layout : layouts) {
+        std::vector<std::string> streams;
+        std::vector<Bytes> decoded;
+        for (unsigned b = 0; b < 4; ++b) {
+            JpegBlockPlan block;
+            block.progressive = layout.progressive;
+            block.restartRows = layout.restarts ? 1 : 0;
+            Bytes stream = EncodeJpegBlock(TestPattern(kSide, kSide, 1, b), block);
+            if (layout.thumbnail && b == 0)
+                stream.insert(stream.begin() + 2, app1.begin(), app1.end());
+            decoded.push_back(DecodeJpegBlock(stream, 1));
+            const Bytes nitf = BuildNitfJpegData({stream}, NitfApp6Plan{2, 2, 0, 0});
+            streams.emplace_back((layout.fill ? "\xFF\xFF\xFF" : "") + std::string(nitf.begin(), nitf.end()));
+        }
+        NitfImagePlan plan;
+        plan.rows = plan.columns = 2 * kSide;
+        plan.NBPR = plan.NBPC = 2;
+        plan.NPPBH = plan.NPPBV = kSide;
+        plan.IC = layout.masked ? "M3" : "C3";
+        plan.COMRAT = "00.0";
+        std::string data = JoinBlocks(streams);
+        if (layout.masked) { // blocks 3, 0, 1 in this order, padding before each; block 2 not stored
+            std::vector<uint32_t> records(4, 0xFFFFFFFF);
+            data.clear();
+            for (unsigned b : {3, 0, 1}) {
+                data += std::string("\0\xFF\xD9\xFF", 4);
+                records[b] = uint32_t(data.size());
+                data += streams[b];
+            }
+            decoded[2].assign(kSide * kSide, 0);
+            std::vector<uint32_t> sharing = records; // two blocks that share one stream are refused
+            sharing[0] = sharing[1];
+            LoadedImage shared(BuildImageFile(plan, BuildMaskTable(sharing) + data));
+            EXPECT_TRUE(shared.Open() && shared.Row(0).empty());
+            data = BuildMaskTable(records) + data;
+        }
+        LoadedImage loaded(BuildImageFile(plan, data));
+        const bool opened = loaded.Open();
+        Bytes ours, expected;
+        for (uint32_t row = 0; opened && row < 2 * kSide; ++row) {
+            const Bytes drawn = Head(loaded.Row(row), 2 * kSide);
+            ours.insert(ours.end(), drawn.begin(), drawn.end());
+            for (uint32_t column = 0; column < 2; ++column) {
+                const auto line = decoded[row / kSide * 2 + column].begin() + row % kSide * kSide;
+                expected.insert(expected.end(), line, line + kSide);
+            }
+        }
+        EXPECT_TRUE(!ours.empty() && ours == expected) << layout.name;
+    }
 }
 
 } // namespace
