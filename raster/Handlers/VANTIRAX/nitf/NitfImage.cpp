@@ -96,8 +96,15 @@ bool CNitfImage::PrepareData(CFileReader& reader, uint32_t dataLength)
     default:
         break;
     }
+    // The host reads rows by the pixel kind that IsPaletted chooses.
+    served = served && OutputPixelBytes() == HostPixelBytes();
     isPrepared = served ? 1 : 0;
     return served;
+}
+
+uint32_t CNitfImage::HostPixelBytes() const
+{
+    return IsPaletted() ? 1 : kRgbTables;
 }
 
 // The block geometry every row read relies on: blocks that cover the image,
@@ -225,7 +232,8 @@ bool CNitfImage::OpenCompressed(CFileReader& reader, uint32_t dataLength)
     const uint32_t blocks = jpeg ? storedBlockCount : uint32_t(NBPR) * uint32_t(NBPC);
     const uint32_t length = static_cast<uint32_t>(std::min<uint64_t>(dataLength, readLimit - start));
     return decoder.Open(reader, start, blocks, length, uint32_t(NBPP), uint32_t(NBANDS), uint32_t(NCOLS),
-                        uint32_t(NROWS), COMRAT[0] == '1', uint32_t(NPPBH), uint32_t(NPPBV));
+                        uint32_t(NROWS), COMRAT[0] == '1', uint32_t(NPPBH), uint32_t(NPPBV),
+                        compressionKind == kDownsampledJpeg);
 }
 
 void CNitfImage::ReleaseDecoder()

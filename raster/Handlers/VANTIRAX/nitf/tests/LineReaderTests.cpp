@@ -1,4 +1,6 @@
 #include "nitf/tests/NitfTestFile.h"
+#include "tests/fixtures/BiLevelWriter.h"
+#include "tests/fixtures/JpegBlockWriter.h"
 #include "tests/fixtures/NitfImageWriter.h"
 
 #include <gtest/gtest.h>
@@ -33,12 +35,6 @@ std::vector<uint8_t> ExpectedRgbRow(int32_t row, int32_t first, int32_t last)
         for (int32_t band = 0; band < 3; ++band)
             expected.push_back(uint8_t(Ramp(band, row, c)));
     return expected;
-}
-
-std::vector<uint8_t> Head(std::vector<uint8_t> row, size_t count)
-{
-    row.resize(std::min(row.size(), count));
-    return row;
 }
 
 // The band stride of IMODE "S" is a whole band of padded blocks, not NROWS x NCOLS.
@@ -195,6 +191,61 @@ TEST(LineReader, RefusesGeometriesThatDoNotFitTheFile)
     plan.NBPC = 999;
     LoadedImage masked(BuildImageFile(plan, BuildMaskedData(BuildImageBlocks(good, Ramp), {true, true, true, true})));
     EXPECT_FALSE(masked.Parse());
+}
+
+// A compressed image is served only when the decoder's rows (one byte per
+// pixel, or three for NBPP x NBANDS 24) are what the host reads by the pixel
+// kind: one palette index, or R,G,B.
+TEST(LineReader, CompressedImagesAreServedOnlyAsTheHostReadsTheirRows)
+{
+    const std::vector<uint8_t> strip = EncodeT4Strip(std::vector<uint8_t>(2 * 16, 0), 16, 16, false);
+    const Bytes jpeg = BuildNitfJpegData({EncodeJpegBlock(TestPattern(16, 16, 1, 1), {})}, {});
+    struct Case {
+        const char* IC;
+        const char* IREP;
+        size_t bands;
+        bool served;
+    };
+    for (const Case& c : {Case{"C1", "MONO", 1, true}, Case{"C1", "2IMO", 1, false}, Case{"C3", "MONO", 1, true},
+                          Case{"C3", "NODISPLY", 1, false}, Case{"C3", "MONO", 3, false}, Case{"C3", "RGB", 3, true}}) {
+        NitfImagePlan plan;
+        plan.rows = plan.columns = 16;
+        plan.IC = c.IC;
+        plan.COMRAT = c.IC[1] == '1' ? "1D  " : "00.0";
+        plan.IREP = c.IREP;
+        plan.NBPP = c.IC[1] == '1' ? 1 : 8;
+        plan.bands.resize(c.bands);
+        LoadedImage loaded(BuildImageFile(plan, c.IC[1] == '1' ? std::string(strip.begin(), strip.end())
+                                                                : std::string(jpeg.begin(), jpeg.end())));
+        EXPECT_EQ(loaded.Open(), c.served) << c.IC << " " << c.IREP << " " << c.bands;
+    }
+}
+
+// "I1": an 8 x 8 frame drawn at the declared 16 x 16, each pixel twice
+// across and down; the same stream as "C3" does not fill its block.
+TEST(LineReader, DownsampledJpegIsDrawnAtTheDeclaredSize)
+{
+    const Bytes frame = [] {
+        JpegBlockPlan eighth;
+        eighth.width = eighth.height = 8;
+        return EncodeJpegBlock(TestPattern(8, 8, 1, 2), eighth);
+    }();
+    const Bytes decoded = DecodeJpegBlock(frame, 1);
+    const Bytes data = BuildNitfJpegData({frame}, {});
+    NitfImagePlan plan;
+    plan.rows = plan.columns = 16;
+    plan.COMRAT = "00.0";
+    for (const char* IC : {"I1", "C3"}) {
+        plan.IC = IC;
+        LoadedImage loaded(BuildImageFile(plan, std::string(data.begin(), data.end())));
+        ASSERT_TRUE(loaded.Open()) << IC;
+        for (uint32_t row = 0; row < 16; ++row) {
+            std::vector<uint8_t> expected;
+            for (uint32_t column = 0; column < 16; ++column)
+                expected.push_back(decoded[row / 2 * 8 + column / 2]);
+            EXPECT_EQ(Head(loaded.Row(row), 16), IC[0] == 'I' ? expected : std::vector<uint8_t>{}) << IC << row;
+        }
+    }
 }
 
 TEST(LineReader, CompressedKindsWithoutDecodableDataFailTheirRows)
