@@ -200,13 +200,7 @@ TEST(JpegDecode, HostileStreamsFailCleanly)
 // pixels repeated (across, down) times, or fail (0) when it does not fill the block.
 TEST(JpegDecode, BlocksGiveRowsOnlyFromFramesThatFillThem)
 {
-    struct Case {
-        const char* what;
-        uint32_t width, height;
-        int components;
-        bool downsampled;
-        uint32_t across, down;
-    };
+    struct Case { const char* what; uint32_t width, height; int components; bool downsampled; uint32_t across, down; };
     const Case cases[] = {
         {"whole frame", kSide, kSide, 1, false, 1, 1},
         {"8 rows of a 16-row block", kSide, 8, 1, false, 0, 0},
@@ -221,10 +215,7 @@ TEST(JpegDecode, BlocksGiveRowsOnlyFromFramesThatFillThem)
     };
     const Bytes whole = EncodeJpegBlock(TestPattern(kSide, kSide, 1, 20), {});
     for (const Case& c : cases) {
-        JpegBlockPlan plan;
-        plan.width = c.width;
-        plan.height = c.height;
-        plan.components = c.components;
+        JpegBlockPlan plan {c.width, c.height, c.components};
         const Bytes frame = EncodeJpegBlock(TestPattern(c.width, c.height, c.components, 21), plan);
         const Bytes decoded = DecodeJpegBlock(frame, c.components);
         OpenedJpeg image(BuildNitfJpegData({whole, frame}, NitfApp6Plan {2, 1, 0, 0}), 2, 1, kSide, c.downsampled);

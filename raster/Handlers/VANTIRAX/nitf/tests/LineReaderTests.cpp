@@ -195,56 +195,32 @@ TEST(LineReader, RefusesGeometriesThatDoNotFitTheFile)
 
 // A compressed image is served only when the decoder's rows (one byte per
 // pixel, or three for NBPP x NBANDS 24) are what the host reads by the pixel
-// kind: one palette index, or R,G,B.
-TEST(LineReader, CompressedImagesAreServedOnlyAsTheHostReadsTheirRows)
+// kind: one palette index, or R,G,B. An 8 x 8 frame fills a 16 x 16 "I1"
+// image (each pixel twice across and down; JpegDecode tests the pixels), but
+// no "C3" block.
+TEST(LineReader, CompressedImagesServeOnlyRowsTheirDecoderFills)
 {
     const std::vector<uint8_t> strip = EncodeT4Strip(std::vector<uint8_t>(2 * 16, 0), 16, 16, false);
-    const Bytes jpeg = BuildNitfJpegData({EncodeJpegBlock(TestPattern(16, 16, 1, 1), {})}, {});
-    struct Case {
-        const char* IC;
-        const char* IREP;
-        size_t bands;
-        bool served;
-    };
-    for (const Case& c : {Case{"C1", "MONO", 1, true}, Case{"C1", "2IMO", 1, false}, Case{"C3", "MONO", 1, true},
-                          Case{"C3", "NODISPLY", 1, false}, Case{"C3", "MONO", 3, false}, Case{"C3", "RGB", 3, true}}) {
+    const Bytes whole = BuildNitfJpegData({EncodeJpegBlock(TestPattern(16, 16, 1, 1), {})}, {});
+    const Bytes small = BuildNitfJpegData({EncodeJpegBlock(TestPattern(8, 8, 1, 2), JpegBlockPlan {8, 8})}, {});
+    struct Case { const char* IC; const char* IREP; size_t bands; const Bytes& jpeg; bool served, drawn; };
+    for (const Case& c : {Case{"C1", "MONO", 1, whole, true, true}, Case{"C1", "2IMO", 1, whole, false, false},
+                          Case{"C3", "MONO", 1, whole, true, true}, Case{"C3", "NODISPLY", 1, whole, false, false},
+                          Case{"C3", "MONO", 3, whole, false, false}, Case{"C3", "MONO", 1, small, true, false},
+                          Case{"I1", "MONO", 1, small, true, true}}) {
+        const bool biLevel = std::string(c.IC) == "C1";
         NitfImagePlan plan;
         plan.rows = plan.columns = 16;
         plan.IC = c.IC;
-        plan.COMRAT = c.IC[1] == '1' ? "1D  " : "00.0";
+        plan.COMRAT = biLevel ? "1D  " : "00.0";
         plan.IREP = c.IREP;
-        plan.NBPP = c.IC[1] == '1' ? 1 : 8;
+        plan.NBPP = biLevel ? 1 : 8;
         plan.bands.resize(c.bands);
-        LoadedImage loaded(BuildImageFile(plan, c.IC[1] == '1' ? std::string(strip.begin(), strip.end())
-                                                                : std::string(jpeg.begin(), jpeg.end())));
-        EXPECT_EQ(loaded.Open(), c.served) << c.IC << " " << c.IREP << " " << c.bands;
-    }
-}
-
-// "I1": an 8 x 8 frame drawn at the declared 16 x 16, each pixel twice
-// across and down; the same stream as "C3" does not fill its block.
-TEST(LineReader, DownsampledJpegIsDrawnAtTheDeclaredSize)
-{
-    const Bytes frame = [] {
-        JpegBlockPlan eighth;
-        eighth.width = eighth.height = 8;
-        return EncodeJpegBlock(TestPattern(8, 8, 1, 2), eighth);
-    }();
-    const Bytes decoded = DecodeJpegBlock(frame, 1);
-    const Bytes data = BuildNitfJpegData({frame}, {});
-    NitfImagePlan plan;
-    plan.rows = plan.columns = 16;
-    plan.COMRAT = "00.0";
-    for (const char* IC : {"I1", "C3"}) {
-        plan.IC = IC;
-        LoadedImage loaded(BuildImageFile(plan, std::string(data.begin(), data.end())));
-        ASSERT_TRUE(loaded.Open()) << IC;
-        for (uint32_t row = 0; row < 16; ++row) {
-            std::vector<uint8_t> expected;
-            for (uint32_t column = 0; column < 16; ++column)
-                expected.push_back(decoded[row / 2 * 8 + column / 2]);
-            EXPECT_EQ(Head(loaded.Row(row), 16), IC[0] == 'I' ? expected : std::vector<uint8_t>{}) << IC << row;
-        }
+        LoadedImage loaded(BuildImageFile(plan, biLevel ? std::string(strip.begin(), strip.end())
+                                                        : std::string(c.jpeg.begin(), c.jpeg.end())));
+        const std::string what = std::string(c.IC) + " " + c.IREP + " " + std::to_string(c.bands);
+        ASSERT_EQ(loaded.Open(), c.served) << what;
+        EXPECT_EQ(loaded.Row(15).empty(), !c.drawn) << what;
     }
 }
 
