@@ -460,7 +460,7 @@ bool CLeadToolLibWrapper::GetBiLevelRow(const ImagingBinding& library, uint32_t 
                                         uint32_t lastColumn, uint32_t byteCount, uint8_t* destination)
 {
     BITMAPHANDLE* bitmap = bitmaps[0];
-    if (lastColumn >= bitmap->width)
+    if (bitmap->bitsPerPixel != 1 || lastColumn >= bitmap->width)
         return false;
     uint32_t scratchSize = std::min(byteCount, bitmap->bytesPerLine);
     std::unique_ptr<uint8_t[]> packed(new uint8_t[scratchSize + 1]);

@@ -11,6 +11,7 @@ constexpr unsigned kPvtypePosition = 349;
 constexpr int32_t kGreyPaletteSize = 256;
 constexpr int32_t kLastPaletteIndex = 255;
 constexpr unsigned kRgbTables = 3;
+constexpr uint32_t kRgbPixelBytes = 3;
 constexpr unsigned kSmallestJpegStream = 4; // SOI and EOI markers
 
 // product *= factor, false when the product would pass limit.
@@ -104,7 +105,7 @@ bool CNitfImage::PrepareData(CFileReader& reader, uint32_t dataLength)
 
 uint32_t CNitfImage::HostPixelBytes() const
 {
-    return IsPaletted() ? 1 : kRgbTables;
+    return IsPaletted() ? 1 : kRgbPixelBytes;
 }
 
 // The block geometry every row read relies on: blocks that cover the image,
