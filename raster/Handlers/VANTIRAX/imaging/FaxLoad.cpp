@@ -104,6 +104,7 @@ bool DecodeRows(TIFF* tiff, const LoadRequest& request)
         if (TIFFReadScanline(tiff, bitmap->pixels + size_t(row) * bitmap->bytesPerLine, row, 0) < 0)
             return false;
     MakeSetBitsBlack(tiff, bitmap);
+    request.info->decodedRows = height;
     return true;
 }
 

@@ -50,7 +50,7 @@ bool ValidRecords(const BITMAPHANDLE* bitmap, uint32_t structSize, const LOADFIL
 int Decode(const LoadRequest& request)
 {
     FILEINFO& info = *request.info;
-    info.width = info.height = info.bitsPerPixel = info.colorConverted = 0;
+    info.width = info.height = info.bitsPerPixel = info.colorConverted = info.decodedRows = 0;
     bool loaded = false;
     if (IsJpegStream(request.data, request.size))
         loaded = FrameMarker(request.data, request.size) == kLosslessFrame ? LoadLosslessJpegStream(request)
@@ -59,7 +59,7 @@ int Decode(const LoadRequest& request)
         loaded = LoadFaxTiff(request);
     if (!loaded) {
         L_FreeBitmap(request.bitmap);
-        info.colorConverted = 0;
+        info.colorConverted = info.decodedRows = 0;
         return kLoadFailed;
     }
     info.width = request.bitmap->width;

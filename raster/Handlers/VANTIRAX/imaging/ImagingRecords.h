@@ -33,11 +33,12 @@ struct LOADFILEOPTION {
 // What a load found in the stream.
 struct FILEINFO {
     uint32_t structSize;
-    uint32_t width;
+    uint32_t width;             // the frame, as the bitmap holds it
     uint32_t height;
     uint32_t bitsPerPixel;
     uint32_t colorConverted;    // 1: the three components were delivered as R,G,B
-    uint32_t reserved;          // cleared by the caller before every load
+    uint32_t decodedRows;       // rows of the bitmap decoded from the stream, from the top: fewer
+                                // than height when the stream's data ran out (the rest is zeros)
 };
 
 // Load flags. The JPEG loads pass kLoadFlagsJpeg, with kLoadFlagRgbStream

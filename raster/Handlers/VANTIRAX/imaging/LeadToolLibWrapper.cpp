@@ -29,7 +29,10 @@ constexpr uint32_t kSmallestJpegStream = 2 + 13 + 10 + 2;
 constexpr uint32_t kLargestNitfBlockSide = 8192;
 // The pixels one image may hold decoded in memory.
 constexpr uint64_t kMaxImageBytes = uint64_t(1) << 30;
+// The largest factor by which an "I1" frame may have been downsampled.
+constexpr uint32_t kLargestDownsampling = 8;
 
+constexpr unsigned kGreyBits = 8;
 constexpr unsigned kColourBits = 24;
 constexpr uint8_t kRgbStreamColour = 1;
 constexpr uint8_t kWhitePixel = 255;
@@ -182,13 +185,33 @@ FILEINFO FreshFileInfo()
 {
     FILEINFO info {};
     info.structSize = sizeof info;
-    info.reserved = 0;
     return info;
 }
 
 uint64_t BitmapBytes(const BITMAPHANDLE* bitmap)
 {
     return uint64_t(bitmap->bytesPerLine) * bitmap->height;
+}
+
+// The smallest whole number of times a frame side must be repeated to reach
+// extent pixels (1 when it reaches them already).
+uint32_t RepeatFactor(uint32_t frame, uint32_t extent)
+{
+    if (frame == 0)
+        return UINT32_MAX;
+    return extent <= frame ? 1 : (extent - 1) / frame + 1;
+}
+
+// The span's pixels, fetched from the frame to the start of `row`, spread
+// over columns first to first + count - 1, each frame pixel repeated
+// `factor` times. Worked from the end: no pixel is read after it is overwritten.
+void RepeatPixels(uint8_t* row, uint32_t first, uint32_t count, uint32_t factor, uint32_t pixelBytes)
+{
+    const uint32_t origin = first / factor;
+    for (uint32_t i = count; i-- > 0;) {
+        const uint32_t source = (first + i) / factor - origin;
+        std::memmove(row + size_t(i) * pixelBytes, row + size_t(source) * pixelBytes, pixelBytes);
+    }
 }
 
 }  // namespace
@@ -223,7 +246,7 @@ bool CLeadToolLibWrapper::PrepareJpeg(CFileReader& reader, uint32_t dataOffset, 
 
 bool CLeadToolLibWrapper::Open(CFileReader& reader, uint32_t dataOffset, uint32_t blockCount, uint32_t LI,
                                uint32_t NBPP, uint32_t NBANDS, uint32_t NCOLS, uint32_t NROWS, bool oneDimensional,
-                               uint32_t blockWidth, uint32_t blockHeight)
+                               uint32_t blockWidth, uint32_t blockHeight, bool downsampledFrames)
 {
     if (kind == kNotPrepared || !EnsureLibrary())
         return false;
@@ -239,6 +262,10 @@ bool CLeadToolLibWrapper::Open(CFileReader& reader, uint32_t dataOffset, uint32_
         return false;
     blockWidthLimit = blockWidth ? blockWidth : (NCOLS > kLargestNitfBlockSide ? NCOLS : kLargestNitfBlockSide);
     blockHeightLimit = blockHeight ? blockHeight : (NROWS > kLargestNitfBlockSide ? NROWS : kLargestNitfBlockSide);
+    // Rows and columns of a block past the image are never asked for.
+    fillWidth = std::min(blockWidth, NCOLS);
+    fillHeight = std::min(blockHeight, NROWS);
+    downsampled = downsampledFrames;
     return openJPEGBitmap(reader, dataOffset, LI);
 }
 
@@ -265,6 +292,7 @@ bool CLeadToolLibWrapper::ReadNitfApp6(CFileReader& reader, uint32_t dataOffset)
 void CLeadToolLibWrapper::AllocateBitmaps(const ImagingBinding& library)
 {
     bitmaps = new BITMAPHANDLE*[bitmapCount]();
+    fills.assign(bitmapCount, BlockFill{});
     freeBitmap = library.L_FreeBitmap;
     for (uint32_t i = 0; i < bitmapCount; ++i) {
         bitmaps[i] = new BITMAPHANDLE();
@@ -332,7 +360,24 @@ bool CLeadToolLibWrapper::LoadBlock(CFileReader& reader, const ImagingBinding& l
     if (loaded != kLoadSucceeded && !LoadWithDefaultTables(reader, library, block, offset, length, options, info))
         return false;
     loaderConverted = info.colorConverted != 0 ? 1 : 0;
+    fills[block] = FillOf(info);
     return true;
+}
+
+// A frame fills its block when it has the image's depth (grey or colour
+// bytes, as rows are delivered) and covers the part of the block the image's
+// rows reach; an "I1" frame when it does so with each pixel repeated a whole
+// number of times across and down (each direction on its own), at most
+// kLargestDownsampling. Rows past those decoded from the stream stay unfilled.
+CLeadToolLibWrapper::BlockFill CLeadToolLibWrapper::FillOf(const FILEINFO& info) const
+{
+    const uint32_t largest = downsampled ? kLargestDownsampling : 1;
+    const uint32_t across = RepeatFactor(info.width, fillWidth);
+    const uint32_t down = RepeatFactor(info.height, fillHeight);
+    const bool byteDepth = info.bitsPerPixel == kGreyBits || info.bitsPerPixel == kColourBits;
+    if (!byteDepth || info.bitsPerPixel != bitsPerPixel * bandCount || across > largest || down > largest)
+        return BlockFill{};
+    return BlockFill{info.decodedRows * down, across, down};
 }
 
 bool CLeadToolLibWrapper::LoadWithDefaultTables(CFileReader& reader, const ImagingBinding& library, uint32_t block,
@@ -412,28 +457,56 @@ bool CLeadToolLibWrapper::GetRow(uint32_t block, uint32_t row, uint32_t firstCol
     if (!CopyBinding(library) || bitmaps == nullptr || block >= bitmapCount || destination == nullptr ||
         lastColumn < firstColumn)
         return false;
-    BITMAPHANDLE* bitmap = bitmaps[block];
-    int64_t fetched = 0;
-    if (kind == kBiLevelDecoder) {
-        uint32_t scratchSize = byteCount < bitmap->bytesPerLine ? byteCount : bitmap->bytesPerLine;
-        std::unique_ptr<uint8_t[]> packed(new uint8_t[scratchSize + 1]);
-        library.L_AccessBitmap(bitmap);
-        fetched = library.L_GetBitmapRowCol(bitmap, packed.get(), row, firstColumn, scratchSize);
-        library.L_ReleaseBitmap(bitmap);
-        uint64_t pixels = uint64_t(lastColumn) - firstColumn + 1;
-        if (fetched > 0 && pixels > uint64_t(fetched) * 8)
-            pixels = uint64_t(fetched) * 8;
-        for (uint64_t i = 0; fetched > 0 && i < pixels; ++i)
-            destination[i] = (packed[i / 8] & (0x80 >> (i % 8))) ? kBlackPixel : kWhitePixel;
-        return fetched >= 1;
-    }
+    if (kind == kBiLevelDecoder)
+        return block == 0 && GetBiLevelRow(library, row, firstColumn, lastColumn, byteCount, destination);
+    return GetJpegRow(library, block, row, firstColumn, lastColumn, byteCount, destination);
+}
+
+bool CLeadToolLibWrapper::GetBiLevelRow(const ImagingBinding& library, uint32_t row, uint32_t firstColumn,
+                                        uint32_t lastColumn, uint32_t byteCount, uint8_t* destination)
+{
+    BITMAPHANDLE* bitmap = bitmaps[0];
+    if (bitmap->bitsPerPixel != 1 || lastColumn >= bitmap->width)
+        return false;
+    uint32_t scratchSize = std::min(byteCount, bitmap->bytesPerLine);
+    std::unique_ptr<uint8_t[]> packed(new uint8_t[scratchSize + 1]);
     library.L_AccessBitmap(bitmap);
-    fetched = library.L_GetBitmapRowCol(bitmap, destination, row, firstColumn, byteCount);
+    int64_t fetched = library.L_GetBitmapRowCol(bitmap, packed.get(), row, firstColumn, scratchSize);
     library.L_ReleaseBitmap(bitmap);
-    if (bitsPerPixel * bandCount == kColourBits && streamColor() == kRgbStreamColour && byteCount != 0 &&
-        !loaderConverted)
-        ConvertColours(destination, fetched);
-    return fetched >= 1;
+    uint64_t pixels = uint64_t(lastColumn) - firstColumn + 1;
+    if (fetched < 1 || pixels > uint64_t(fetched) * 8)
+        return false;
+    for (uint64_t i = 0; i < pixels; ++i)
+        destination[i] = (packed[i / 8] & (0x80 >> (i % 8))) ? kBlackPixel : kWhitePixel;
+    return true;
+}
+
+// The frame's pixels under the span are fetched, then repeated over it when
+// the frame was downsampled.
+bool CLeadToolLibWrapper::GetJpegRow(const ImagingBinding& library, uint32_t block, uint32_t row,
+                                     uint32_t firstColumn, uint32_t lastColumn, uint32_t byteCount,
+                                     uint8_t* destination)
+{
+    if (block >= fills.size() || row >= fills[block].rows)
+        return false;
+    const BlockFill fill = fills[block];
+    const uint32_t pixelBytes = bitsPerPixel * bandCount / 8;   // 1 or 3 where a frame fills the block
+    const uint64_t count = uint64_t(lastColumn) - firstColumn + 1;
+    if (count * pixelBytes > byteCount)
+        return false;
+    const uint32_t frameColumn = firstColumn / fill.across;
+    const uint32_t frameBytes = (lastColumn / fill.across - frameColumn + 1) * pixelBytes;
+    BITMAPHANDLE* bitmap = bitmaps[block];
+    library.L_AccessBitmap(bitmap);
+    int64_t fetched = library.L_GetBitmapRowCol(bitmap, destination, row / fill.down, frameColumn, frameBytes);
+    library.L_ReleaseBitmap(bitmap);
+    if (fetched != int64_t(frameBytes))
+        return false;
+    if (fill.across > 1)
+        RepeatPixels(destination, firstColumn, uint32_t(count), fill.across, pixelBytes);
+    if (bitsPerPixel * bandCount == kColourBits && streamColor() == kRgbStreamColour && !loaderConverted)
+        ConvertColours(destination, int64_t(count) * pixelBytes);
+    return true;
 }
 
 void CLeadToolLibWrapper::FreeBitmaps()
@@ -447,4 +520,5 @@ void CLeadToolLibWrapper::FreeBitmaps()
     }
     delete[] bitmaps;
     bitmaps = nullptr;
+    fills.clear();
 }

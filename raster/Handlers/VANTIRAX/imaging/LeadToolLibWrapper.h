@@ -4,7 +4,9 @@
 //    led by the NITF APP6 segment; masked JPEG ("M3", "M5"): one stream per
 //    stored block, wherever the mask table places it. Streams are found by
 //    walking their marker segments. A stream that leaves out its DQT or DHT
-//    gets the NITF defaults, chosen by the APP6 quality byte.
+//    gets the NITF defaults, chosen by the APP6 quality byte. A block's rows
+//    come only from a frame of the image's depth that fills the block; an
+//    "I1" frame was downsampled and fills it with each pixel repeated.
 //  - Bi-level (IC "C1"): one CCITT T.4 strip for the whole image, decoded
 //    after wrapping it in a fixed TIFF header.
 // The three texts of kDecoderErrorTexts are thrown as std::runtime_error;
@@ -54,13 +56,16 @@ public:
     // dataOffset (LI 0: up to the end of the file). blockWidth and
     // blockHeight (NPPBH, NPPBV) bound the size a block's stream may declare;
     // 0 means not known, and the bound is then the largest block NITF allows
-    // for an image of NCOLS x NROWS.
+    // for an image of NCOLS x NROWS, and any frame fills its block.
+    // downsampled: the image is "I1".
     bool Open(CFileReader& reader, uint32_t dataOffset, uint32_t blockCount, uint32_t LI, uint32_t NBPP,
               uint32_t NBANDS, uint32_t NCOLS, uint32_t NROWS, bool oneDimensional,
-              uint32_t blockWidth = 0, uint32_t blockHeight = 0);
-    // Copies byteCount bytes of row `row` of block `block`, from column
-    // firstColumn on, to destination. Bi-level rows come out one byte per
-    // pixel (black 0, white 255) for lastColumn - firstColumn + 1 pixels.
+              uint32_t blockWidth = 0, uint32_t blockHeight = 0, bool downsampled = false);
+    // Row `row` of block `block`, columns firstColumn to lastColumn, into
+    // destination, which holds byteCount bytes. JPEG rows come out one byte
+    // per band and pixel, and fail unless byteCount holds them and every one
+    // comes from the block's frame. Bi-level rows come out one byte per pixel
+    // (black 0, white 255); byteCount bounds the packed bytes read for them.
     bool GetRow(uint32_t block, uint32_t row, uint32_t firstColumn, uint32_t lastColumn, uint32_t byteCount,
                 uint8_t* destination);
     void FreeBitmaps();
@@ -74,12 +79,30 @@ public:
     uint8_t streamColor() const { return app6[kApp6StreamColorOffset]; }
 
 private:
+    // How a JPEG block's bitmap gives the block's rows: each pixel repeated
+    // `across` and `down` times (1, or an "I1" image's downsampling factors),
+    // for the block's first `rows` rows. rows 0: none, every row fails.
+    struct BlockFill {
+        uint32_t rows;
+        uint32_t across;
+        uint32_t down;
+    };
+
     static constexpr unsigned kApp6QualityOffset = 20;
     static constexpr unsigned kApp6StreamColorOffset = 21;
     uint32_t blockWidthLimit = 0;           // the largest frame a block's stream may declare
     uint32_t blockHeightLimit = 0;
+    uint32_t fillWidth = 0;                 // the part of a block the image's rows reach; 0: not known
+    uint32_t fillHeight = 0;
+    bool downsampled = false;               // "I1"
+    std::vector<BlockFill> fills;           // per JPEG bitmap
     L_FreeBitmapFunction freeBitmap = nullptr;  // the kernel that allocated `bitmaps`
 
+    BlockFill FillOf(const FILEINFO& info) const;
+    bool GetBiLevelRow(const ImagingBinding& library, uint32_t row, uint32_t firstColumn, uint32_t lastColumn,
+                       uint32_t byteCount, uint8_t* destination);
+    bool GetJpegRow(const ImagingBinding& library, uint32_t block, uint32_t row, uint32_t firstColumn,
+                    uint32_t lastColumn, uint32_t byteCount, uint8_t* destination);
     void AllocateBitmaps(const ImagingBinding& library);
     uint32_t LoadFlags() const;
     bool LoadBlock(CFileReader& reader, const ImagingBinding& library, uint32_t block, uint32_t offset,

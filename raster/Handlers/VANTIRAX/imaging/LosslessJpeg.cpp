@@ -273,8 +273,12 @@ bool DecodeScan(BitReader& bits, const LosslessState& state, const LosslessScan&
                 row[at] = static_cast<uint8_t>(((prediction + difference) & sampleMask) << shift);
             }
         }
+        // Data that has run out ends the scan: a frame can declare far more
+        // samples than its stream codes.
+        if (bits.overrun)
+            return false;
     }
-    return !bits.overrun;
+    return true;
 }
 
 }  // namespace
@@ -307,5 +311,6 @@ bool LoadLosslessJpegStream(const LoadRequest& request)
             return false;
     }
     request.info->colorConverted = state.frame.componentCount == kMaxComponents ? 1 : 0;
+    request.info->decodedRows = state.frame.height;
     return decodedScan && walk.Complete();
 }

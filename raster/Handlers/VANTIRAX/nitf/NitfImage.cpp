@@ -11,6 +11,7 @@ constexpr unsigned kPvtypePosition = 349;
 constexpr int32_t kGreyPaletteSize = 256;
 constexpr int32_t kLastPaletteIndex = 255;
 constexpr unsigned kRgbTables = 3;
+constexpr uint32_t kRgbPixelBytes = 3;
 constexpr unsigned kSmallestJpegStream = 4; // SOI and EOI markers
 
 // product *= factor, false when the product would pass limit.
@@ -96,8 +97,15 @@ bool CNitfImage::PrepareData(CFileReader& reader, uint32_t dataLength)
     default:
         break;
     }
+    // The host reads rows by the pixel kind that IsPaletted chooses.
+    served = served && OutputPixelBytes() == HostPixelBytes();
     isPrepared = served ? 1 : 0;
     return served;
+}
+
+uint32_t CNitfImage::HostPixelBytes() const
+{
+    return IsPaletted() ? 1 : kRgbPixelBytes;
 }
 
 // The block geometry every row read relies on: blocks that cover the image,
@@ -223,7 +231,8 @@ bool CNitfImage::OpenCompressed(CFileReader& reader, uint32_t dataLength)
     const uint32_t blockedLength = dataLength > maskTableLength ? dataLength - maskTableLength : 0;
     const uint32_t length = static_cast<uint32_t>(std::min<uint64_t>(blockedLength, readLimit - dataOffset));
     return decoder.Open(reader, dataOffset, blocks, length, uint32_t(NBPP), uint32_t(NBANDS), uint32_t(NCOLS),
-                        uint32_t(NROWS), COMRAT[0] == '1', uint32_t(NPPBH), uint32_t(NPPBV));
+                        uint32_t(NROWS), COMRAT[0] == '1', uint32_t(NPPBH), uint32_t(NPPBV),
+                        compressionKind == kDownsampledJpeg);
 }
 
 void CNitfImage::ReleaseDecoder()

@@ -84,6 +84,8 @@ public:
     // Whether the image is served; sets up the decoder for compressed kinds.
     bool PrepareData(CFileReader& reader, uint32_t dataLength);
     bool IsPaletted() const;
+    // Bytes per pixel of the rows the host expects: one palette index, or R,G,B.
+    uint32_t HostPixelBytes() const;
     int32_t GetPaletteSize() const;
     bool GetPaletteEntry(int32_t index, uint8_t& red, uint8_t& green, uint8_t& blue) const;
     void AllocLineBuffer();

@@ -14,6 +14,12 @@ namespace {
 constexpr size_t kRpfRowBytesPerPixel = 2;
 constexpr size_t kNitfRowBytesPerPixel = 3;
 
+// Test builds fill the row buffer with this before each line, so that a
+// byte a line reported as decoded but never wrote shows as the pattern.
+#ifdef VX_POISON_ROWS
+constexpr uint8_t kPoisonByte = 0xA5;
+#endif
+
 } // namespace
 
 void ReleaseHandleRecords(RHHandle* handle)
@@ -108,7 +114,8 @@ void CRasterHandler::DoStartDraw(const int32_t rect[4], uint32_t* rowWidth)
 
     const size_t bytesPerPixel = mode == kModeRpfFrame ? kRpfRowBytesPerPixel : kNitfRowBytesPerPixel;
     std::free(rowBuffer); // a second draw start without a draw end replaces the buffer
-    rowBuffer = static_cast<uint8_t*>(std::malloc(width > 0 ? size_t(width) * bytesPerPixel : 1));
+    rowBufferBytes = width > 0 ? size_t(width) * bytesPerPixel : 1;
+    rowBuffer = static_cast<uint8_t*>(std::malloc(rowBufferBytes));
     if (rowBuffer == nullptr)
         throw kCodeRowBuffer;
 
@@ -152,6 +159,9 @@ int32_t CRasterHandler::GetLine(RHHandle* handle, uint32_t row, uint8_t** rowAdd
         bool decoded = false;
         // Without a draw there is no buffer to fill: the line fails.
         if (rowBuffer != nullptr && lastColumn >= INT32_MIN) {
+#ifdef VX_POISON_ROWS
+            std::memset(rowBuffer, kPoisonByte, rowBufferBytes);
+#endif
             const auto last = static_cast<int32_t>(lastColumn);
             decoded = mode == kModeRpfFrame ? RpfReadLine(fileReader, row, firstColumn, last, rowBuffer)
                                             : NitfReadLine(fileReader, row, firstColumn, last, rowBuffer);
@@ -178,6 +188,7 @@ void CRasterHandler::DoEndDraw()
     fileReader.ResetState();
     std::free(rowBuffer);
     rowBuffer = nullptr;
+    rowBufferBytes = 0;
 }
 
 int32_t CRasterHandler::EndDraw(RHHandle* handle)

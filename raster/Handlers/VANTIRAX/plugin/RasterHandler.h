@@ -30,6 +30,7 @@ public:
     uint32_t signature = kHandlerSignature;
     char* path = nullptr;
     uint8_t* rowBuffer = nullptr;
+    size_t rowBufferBytes = 0;
     CRpfFrameReader rpfReader;
     CNitfImage nitfImage;
     int32_t drawRect[4] = {};

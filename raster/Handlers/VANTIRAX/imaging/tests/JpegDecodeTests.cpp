@@ -5,7 +5,11 @@
 
 #include <gtest/gtest.h>
 
+#include <set>
 #include <stdexcept>
+
+#include <sys/resource.h>
+#include <unistd.h>
 
 namespace {
 
@@ -18,13 +22,21 @@ struct OpenedJpeg {
     bool prepared = false;
     bool opened = false;
 
-    OpenedJpeg(const Bytes& data, uint32_t blocks, uint32_t bands = 1, uint32_t side = kSide)
+    OpenedJpeg(const Bytes& data, uint32_t blocks, uint32_t bands = 1, uint32_t side = kSide,
+               bool downsampled = false)
         : file(data)
     {
         prepared = decoder.PrepareJpeg(file.reader, kTestDataOffset, uint32_t(data.size()), 8);
         if (prepared)
             opened = decoder.Open(file.reader, kTestDataOffset, blocks, uint32_t(data.size()), 8, bands,
-                                  side * blocks, side, false, side, side);
+                                  side * blocks, side, false, side, side, downsampled);
+    }
+
+    // Columns first to last of a row of a grey block; empty when GetRow fails.
+    Bytes Row(uint32_t block, uint32_t row, uint32_t first = 0, uint32_t last = kSide - 1)
+    {
+        Bytes pixels(last - first + 1);
+        return decoder.GetRow(block, row, first, last, uint32_t(pixels.size()), pixels.data()) ? pixels : Bytes {};
     }
 
     // Every row of a block, as GetRow delivers them.
@@ -36,6 +48,20 @@ struct OpenedJpeg {
         return pixels;
     }
 };
+
+// Sets the width and height of the frame header with the given SOF code.
+void SetFrameSize(Bytes& stream, uint8_t frameCode, uint16_t width, uint16_t height)
+{
+    for (size_t at = 2; at + 8 < stream.size(); ++at)
+        if (stream[at] == 0xFF && stream[at + 1] == frameCode) {
+            stream[at + 5] = uint8_t(height >> 8);
+            stream[at + 6] = uint8_t(height);
+            stream[at + 7] = uint8_t(width >> 8);
+            stream[at + 8] = uint8_t(width);
+            return;
+        }
+    ADD_FAILURE() << "no frame header";
+}
 
 TEST(JpegDecode, FourSelfContainedBlocksDecodeAsLibjpegDoes)
 {
@@ -144,11 +170,7 @@ TEST(JpegDecode, HostileStreamsFailCleanly)
 
     // A frame header declaring 65535 x 65535 in a small stream, no block size given.
     Bytes absurd = EncodeJpegBlock(pattern, {});
-    for (size_t at = 2; at + 8 < absurd.size(); ++at)
-        if (absurd[at] == 0xFF && absurd[at + 1] == 0xC0) {
-            absurd[at + 5] = absurd[at + 6] = absurd[at + 7] = absurd[at + 8] = 0xFF;
-            break;
-        }
+    SetFrameSize(absurd, 0xC0, 0xFFFF, 0xFFFF);
     {
         Bytes data = BuildNitfJpegData({absurd}, {});
         DecoderTestFile file(data);
@@ -174,6 +196,96 @@ TEST(JpegDecode, HostileStreamsFailCleanly)
     ASSERT_TRUE(decoder.PrepareJpeg(file.reader, kTestDataOffset, 0, 8));
     EXPECT_FALSE(decoder.Open(file.reader, kTestDataOffset, 0xFFFFFFFF, 0, 8, 1, kSide, kSide, false));
     EXPECT_EQ(decoder.bitmaps, nullptr);
+}
+
+// Block 0 holds a whole frame; block 1 the case's frame, whose rows are its
+// pixels repeated (across, down) times, or fail (0) when it does not fill the block.
+TEST(JpegDecode, BlocksGiveRowsOnlyFromFramesThatFillThem)
+{
+    struct Case { const char* what; uint32_t width, height; int components; bool downsampled; uint32_t across, down; };
+    const Case cases[] = {
+        {"whole frame", kSide, kSide, 1, false, 1, 1},
+        {"8 rows of a 16-row block", kSide, 8, 1, false, 0, 0},
+        {"8 columns of a 16-column block", 8, kSide, 1, false, 0, 0},
+        {"three components in a one-band image", kSide, kSide, 3, false, 0, 0},
+        {"I1 whole frame", kSide, kSide, 1, true, 1, 1},
+        {"I1 halved across, quartered down", 8, 4, 1, true, 2, 4},
+        {"I1 5 columns: each 4 times", 5, kSide, 1, true, 4, 1},
+        {"I1 2 x 2: each 8 times", 2, 2, 1, true, 8, 8},
+        {"I1 1 column: 16 times is more than 8", 1, kSide, 1, true, 0, 0},
+        {"I1 three components in a one-band image", 8, 8, 3, true, 0, 0},
+    };
+    const Bytes whole = EncodeJpegBlock(TestPattern(kSide, kSide, 1, 20), {});
+    for (const Case& c : cases) {
+        JpegBlockPlan plan {c.width, c.height, c.components};
+        const Bytes frame = EncodeJpegBlock(TestPattern(c.width, c.height, c.components, 21), plan);
+        const Bytes decoded = DecodeJpegBlock(frame, c.components);
+        OpenedJpeg image(BuildNitfJpegData({whole, frame}, NitfApp6Plan {2, 1, 0, 0}), 2, 1, kSide, c.downsampled);
+        ASSERT_TRUE(image.opened) << c.what;
+        EXPECT_EQ(image.Block(0), DecodeJpegBlock(whole, 1)) << c.what;
+        for (uint32_t row = 0; row < kSide; ++row) {
+            if (c.across == 0) {
+                EXPECT_TRUE(image.Row(1, row).empty()) << c.what << " row " << row;
+                continue;
+            }
+            Bytes expected;
+            for (uint32_t column = 0; column < kSide; ++column)
+                expected.push_back(decoded[(row / c.down) * c.width + column / c.across]);
+            EXPECT_EQ(image.Row(1, row), expected) << c.what << " row " << row;
+            EXPECT_EQ(image.Row(1, row, 3, 12), Bytes(expected.begin() + 3, expected.begin() + 13)) << c.what;
+        }
+    }
+}
+
+// A stream cut anywhere in its scan: the rows decoded before the cut come
+// out as libjpeg decodes the whole stream, the rest fail.
+TEST(JpegDecode, StreamCutShortGivesOnlyTheRowsBeforeTheCut)
+{
+    const Bytes stream = EncodeJpegBlock(TestPattern(kSide, kSide, 1, 22), {});
+    const Bytes decoded = DecodeJpegBlock(stream, 1);
+    size_t scan = 2;
+    while (!(stream[scan] == 0xFF && stream[scan + 1] == 0xDA))
+        scan += 2 + ((stream[scan + 2] << 8) | stream[scan + 3]);
+    std::set<uint32_t> rowsGiven;
+    for (size_t cut = scan + 14; cut + 2 < stream.size(); cut += 3) {
+        Bytes shortStream(stream.begin(), stream.begin() + cut);
+        shortStream.insert(shortStream.end(), {0xFF, 0xD9});
+        OpenedJpeg image(BuildNitfJpegData({shortStream}, {}), 1);
+        uint32_t rows = 0;
+        while (rows < kSide && !image.Row(0, rows).empty())
+            ++rows;
+        rowsGiven.insert(rows);
+        for (uint32_t row = 0; row < kSide; ++row)
+            EXPECT_EQ(image.Row(0, row), row < rows ? Bytes(decoded.begin() + row * kSide,
+                                                            decoded.begin() + (row + 1) * kSide)
+                                                    : Bytes {})
+                << "cut at " << cut << ", row " << row;
+    }
+    EXPECT_EQ(rowsGiven, (std::set<uint32_t> {0, 8}));
+}
+
+// A few bytes of coded data under a frame header declaring 32000 x 32000:
+// decoding stops where the data ends instead of writing a gibibyte of rows.
+// The pages the process first touches meanwhile tell (a sanitizer's shadow
+// memory takes a few of its own).
+TEST(JpegDecode, FrameFarLargerThanItsDataStopsWhereTheDataEnds)
+{
+    constexpr uint16_t kDeclared = 32000;
+    const long mostPagesTouched = (768L << 20) / sysconf(_SC_PAGESIZE);
+    Bytes pattern = TestPattern(kSide, kSide, 1, 23);
+    Bytes baseline = EncodeJpegBlock(pattern, {});
+    SetFrameSize(baseline, 0xC0, kDeclared, kDeclared);
+    Bytes lossless = EncodeLosslessJpeg(pattern, LosslessJpegPlan {});
+    SetFrameSize(lossless, 0xC3, kDeclared, kDeclared);
+    for (const Bytes* stream : {&baseline, &lossless}) {
+        rusage before {}, after {};
+        getrusage(RUSAGE_SELF, &before);
+        OpenedJpeg image(BuildNitfJpegData({*stream}, {}), 1, 1, kDeclared);
+        getrusage(RUSAGE_SELF, &after);
+        EXPECT_TRUE(image.prepared);
+        EXPECT_FALSE(image.opened);
+        EXPECT_LT(after.ru_minflt - before.ru_minflt, mostPagesTouched) << (stream == &baseline ? "C3" : "C5");
+    }
 }
 
 TEST(JpegDecode, PreparationNeedsNitfApp6AndEightBitSamples)

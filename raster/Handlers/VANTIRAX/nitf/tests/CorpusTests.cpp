@@ -1,6 +1,7 @@
 // Every NITF file of the shared corpus at the CNitfImage level: the files this
 // library serves draw what GDAL decodes; the rest are refused cleanly.
 #include "nitf/tests/NitfTestFile.h"
+#include "tests/fixtures/JpegBlockWriter.h"
 
 #include <gtest/gtest.h>
 
@@ -130,6 +131,52 @@ TEST(Corpus, ServedFilesDrawAsGdalDecodesThemAndTheRestAreRefused)
     std::remove((raw.substr(0, raw.size() - 4) + ".hdr").c_str());
     for (const auto& [name, outcome] : outcomes)
         std::printf("%-45s %s\n", name.c_str(), outcome.c_str());
+}
+
+std::string ReadCorpusFile(const fs::path& path)
+{
+    std::ifstream in(path, std::ios::binary);
+    return std::string((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
+}
+
+// i_3113g ("I1"): a 512 x 512 stream for a 1023 x 1023 image. GDAL cannot
+// decode it; every row must be libjpeg's decoding of the stream with each
+// pixel repeated twice across and down.
+TEST(Corpus, DownsampledJpegDrawsEveryRowFromItsFrame)
+{
+    const fs::path path = fs::path(VX_CORPUS_DIR) / "jitc-nitf21/i_3113g.ntf";
+    if (!fs::exists(path))
+        GTEST_SKIP() << "no corpus file " << path;
+    LoadedImage loaded(path.string().c_str());
+    ASSERT_TRUE(loaded.Open());
+    const std::string file = ReadCorpusFile(path);
+    const size_t end = file.find("\xFF\xD9", loaded.image.dataOffset);
+    ASSERT_NE(end, std::string::npos);
+    const Bytes frame = DecodeJpegBlock(Bytes(file.begin() + loaded.image.dataOffset, file.begin() + end + 2), 1);
+    ASSERT_EQ(frame.size(), 512u * 512u);
+    for (uint32_t row = 0; row < 1023; ++row) {
+        Bytes expected;
+        for (uint32_t column = 0; column < 1023; ++column)
+            expected.push_back(frame[row / 2 * 512 + column / 2]);
+        ASSERT_EQ(Head(loaded.Row(row), 1023), expected) << "row " << row;
+    }
+}
+
+// i_3041a with its IREP edited to "2IMO": the decoder writes one byte per
+// pixel, which no direct (R,G,B) kind can serve.
+TEST(Corpus, BiLevelImageOfAnotherIrepIsRefused)
+{
+    const fs::path path = fs::path(VX_CORPUS_DIR) / "jitc-nitf21/i_3041a.ntf";
+    if (!fs::exists(path))
+        GTEST_SKIP() << "no corpus file " << path;
+    std::string file = ReadCorpusFile(path);
+    const size_t irep = file.find("MONO    VI");
+    ASSERT_NE(irep, std::string::npos);
+    LoadedImage original(file);
+    EXPECT_TRUE(original.Open());
+    file.replace(irep, 4, "2IMO");
+    LoadedImage edited(file);
+    EXPECT_FALSE(edited.Open());
 }
 
 } // namespace

@@ -1,4 +1,5 @@
 #include "nitf/tests/NitfTestFile.h"
+#include "tests/fixtures/BiLevelWriter.h"
 #include "tests/fixtures/JpegBlockWriter.h"
 #include "tests/fixtures/NitfImageWriter.h"
 
@@ -34,12 +35,6 @@ std::vector<uint8_t> ExpectedRgbRow(int32_t row, int32_t first, int32_t last)
         for (int32_t band = 0; band < 3; ++band)
             expected.push_back(uint8_t(Ramp(band, row, c)));
     return expected;
-}
-
-std::vector<uint8_t> Head(std::vector<uint8_t> row, size_t count)
-{
-    row.resize(std::min(row.size(), count));
-    return row;
 }
 
 // The band stride of IMODE "S" is a whole band of padded blocks, not NROWS x NCOLS.
@@ -196,6 +191,37 @@ TEST(LineReader, RefusesGeometriesThatDoNotFitTheFile)
     plan.NBPC = 999;
     LoadedImage masked(BuildImageFile(plan, BuildMaskedData(BuildImageBlocks(good, Ramp), {true, true, true, true})));
     EXPECT_FALSE(masked.Parse());
+}
+
+// A compressed image is served only when the decoder's rows (one byte per
+// pixel, or three for NBPP x NBANDS 24) are what the host reads by the pixel
+// kind: one palette index, or R,G,B. An 8 x 8 frame fills a 16 x 16 "I1"
+// image (each pixel twice across and down; JpegDecode tests the pixels), but
+// no "C3" block.
+TEST(LineReader, CompressedImagesServeOnlyRowsTheirDecoderFills)
+{
+    const std::vector<uint8_t> strip = EncodeT4Strip(std::vector<uint8_t>(2 * 16, 0), 16, 16, false);
+    const Bytes whole = BuildNitfJpegData({EncodeJpegBlock(TestPattern(16, 16, 1, 1), {})}, {});
+    const Bytes small = BuildNitfJpegData({EncodeJpegBlock(TestPattern(8, 8, 1, 2), JpegBlockPlan {8, 8})}, {});
+    struct Case { const char* IC; const char* IREP; size_t bands; const Bytes& jpeg; bool served, drawn; };
+    for (const Case& c : {Case{"C1", "MONO", 1, whole, true, true}, Case{"C1", "2IMO", 1, whole, false, false},
+                          Case{"C3", "MONO", 1, whole, true, true}, Case{"C3", "NODISPLY", 1, whole, false, false},
+                          Case{"C3", "MONO", 3, whole, false, false}, Case{"C3", "MONO", 1, small, true, false},
+                          Case{"I1", "MONO", 1, small, true, true}}) {
+        const bool biLevel = std::string(c.IC) == "C1";
+        NitfImagePlan plan;
+        plan.rows = plan.columns = 16;
+        plan.IC = c.IC;
+        plan.COMRAT = biLevel ? "1D  " : "00.0";
+        plan.IREP = c.IREP;
+        plan.NBPP = biLevel ? 1 : 8;
+        plan.bands.resize(c.bands);
+        LoadedImage loaded(BuildImageFile(plan, biLevel ? std::string(strip.begin(), strip.end())
+                                                        : std::string(c.jpeg.begin(), c.jpeg.end())));
+        const std::string what = std::string(c.IC) + " " + c.IREP + " " + std::to_string(c.bands);
+        ASSERT_EQ(loaded.Open(), c.served) << what;
+        EXPECT_EQ(loaded.Row(15).empty(), !c.drawn) << what;
+    }
 }
 
 TEST(LineReader, CompressedKindsWithoutDecodableDataFailTheirRows)

@@ -7,6 +7,7 @@
 #include "base/FileReader.h"
 #include "tests/fixtures/TempFiles.h"
 
+#include <algorithm>
 #include <string>
 #include <vector>
 
@@ -53,3 +54,10 @@ struct LoadedImage {
     CFileReader reader;
     CNitfImage image;
 };
+
+// The first count bytes of a row (all of a shorter one).
+inline std::vector<uint8_t> Head(std::vector<uint8_t> row, size_t count)
+{
+    row.resize(std::min(row.size(), count));
+    return row;
+}
