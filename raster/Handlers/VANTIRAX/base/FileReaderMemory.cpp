@@ -63,7 +63,7 @@ uint32_t Read(uint32_t handle, void* buffer, uint32_t count)
 {
     std::lock_guard<std::mutex> hold(registryLock);
     OpenFile* file = Slot(handle);
-    if (file == nullptr || file->position >= file->contents.size)
+    if (file == nullptr || count == 0 || file->position >= file->contents.size)
         return 0;
     uint32_t got = static_cast<uint32_t>(std::min<uint64_t>(count, file->contents.size - file->position));
     std::memcpy(buffer, file->contents.data + file->position, got);
@@ -107,6 +107,8 @@ bool ReadAt(uint32_t handle, uint64_t offset, void* buffer, uint32_t count)
     OpenFile* file = Slot(handle);
     if (file == nullptr || offset > file->contents.size || count > file->contents.size - offset)
         return false;
+    if (count == 0)
+        return true;
     std::memcpy(buffer, file->contents.data + offset, count);
     return true;
 }
