@@ -1,3 +1,7 @@
+// The JPEG decoder on NITF JPEG data (IC "C3"/"M3", lossless "C5") coded by
+// libjpeg and by the lossless fixture writer: each stream decodes as its
+// reference (libjpeg's decoding, or the samples themselves), and streams it
+// cannot decode safely are refused.
 #include "imaging/LeadToolLibWrapper.h"
 #include "imaging/tests/DecoderTestFile.h"
 #include "tests/fixtures/JpegBlockWriter.h"
@@ -11,14 +15,13 @@
 
 namespace {
 
-// The block size of the tests' images.
-constexpr uint32_t kSide = 16;
+constexpr uint32_t kSide = 16; // the blocks of every test
 
 // Decodes a plain JPEG stream with libjpeg, as an independent reference.
 Bytes DecodeWithLibjpeg(const Bytes& stream, int components)
 {
-    jpeg_decompress_struct decoder {};
-    jpeg_error_mgr errors {};
+    jpeg_decompress_struct decoder{};
+    jpeg_error_mgr errors{};
     decoder.err = jpeg_std_error(&errors);
     jpeg_create_decompress(&decoder);
     jpeg_mem_src(&decoder, stream.data(), stream.size());
@@ -35,19 +38,17 @@ Bytes DecodeWithLibjpeg(const Bytes& stream, int components)
     return pixels;
 }
 
+// NITF JPEG data of blocks of kSide x kSide side by side, prepared and opened.
 struct OpenedJpeg {
     DecoderTestFile file;
     CLeadToolLibWrapper decoder;
-    bool prepared = false;
     bool opened = false;
 
-    OpenedJpeg(const Bytes& data, uint32_t blocks, uint32_t bands = 1, uint32_t side = kSide)
-        : file(data)
+    OpenedJpeg(const Bytes& data, uint32_t blocks, uint32_t bands = 1) : file(data)
     {
-        prepared = decoder.PrepareJpeg(file.reader, kTestDataOffset, uint32_t(data.size()), 8);
-        if (prepared)
-            opened = decoder.Open(file.reader, kTestDataOffset, blocks, uint32_t(data.size()), 8, bands,
-                                  side * blocks, side, false, side, side);
+        opened = decoder.PrepareJpeg(file.reader, kTestDataOffset, uint32_t(data.size()), 8) &&
+                 decoder.Open(file.reader, kTestDataOffset, blocks, uint32_t(data.size()), 8, bands, kSide * blocks,
+                              kSide, false, kSide, kSide);
     }
 
     // Every row of a block, as GetRow delivers them.
@@ -60,42 +61,87 @@ struct OpenedJpeg {
     }
 };
 
-TEST(JpegDecode, FourSelfContainedBlocksDecodeAsLibjpegDoes)
+TEST(JpegDecode, StreamsDecodeAsTheirReference)
+{
+    struct Case {
+        std::string what;
+        Bytes stream, expected;
+        int components;
+        uint8_t streamColor; // APP6: 0 grey, 1 R,G,B coded, 2 YCbCr coded
+    };
+    std::vector<Case> cases;
+    const Bytes colour = TestPattern(kSide, kSide, 3, 2);
+    for (bool rgbCoding : {false, true}) {
+        JpegBlockPlan plan;
+        plan.components = 3;
+        plan.rgbCoding = rgbCoding;
+        const Bytes stream = EncodeJpegBlock(colour, plan);
+        cases.push_back({rgbCoding ? "R,G,B coded" : "YCbCr coded", stream, DecodeWithLibjpeg(stream, 3), 3,
+                         uint8_t(rgbCoding ? 1 : 2)});
+    }
+    // Lossless: every predictor, grey and colour, restart intervals, a point transform dropping two low bits.
+    for (int predictor = 1; predictor <= 7; ++predictor)
+        for (int components : {1, 3}) {
+            LosslessJpegPlan plan;
+            plan.components = components;
+            plan.predictor = predictor;
+            plan.restartRows = predictor == 4 ? 4 : 0;
+            plan.pointTransform = predictor == 6 && components == 1 ? 2 : 0;
+            Bytes pixels = TestPattern(kSide, kSide, components, unsigned(predictor));
+            const Bytes stream = EncodeLosslessJpeg(pixels, plan);
+            for (uint8_t& value : pixels)
+                value &= uint8_t(0xFF << plan.pointTransform);
+            cases.push_back({"lossless predictor " + std::to_string(predictor), stream, pixels, components, 0});
+        }
+    for (const Case& c : cases) {
+        OpenedJpeg image(BuildNitfJpegData({c.stream}, NitfApp6Plan{1, 1, 0, c.streamColor}), 1, uint32_t(c.components));
+        ASSERT_TRUE(image.opened) << c.what << ", " << c.components << " components";
+        EXPECT_EQ(image.Block(0, uint32_t(c.components)), c.expected) << c.what << ", " << c.components << " components";
+        EXPECT_EQ(image.decoder.loaderConverted, c.components == 3 ? 1 : 0) << c.what;
+    }
+}
+
+TEST(JpegDecode, BlocksAndSpansStayWithinWhatTheCallerAsked)
 {
     std::vector<Bytes> blocks;
     for (unsigned i = 0; i < 4; ++i)
-        blocks.push_back(EncodeJpegBlock(TestPattern(kSide, kSide, 1, i), JpegBlockPlan {}));
-    OpenedJpeg image(BuildNitfJpegData(blocks, NitfApp6Plan {4, 1, 0, 0}), 4);
-    ASSERT_TRUE(image.prepared);
+        blocks.push_back(EncodeJpegBlock(TestPattern(kSide, kSide, 1, i), JpegBlockPlan{}));
+    OpenedJpeg image(BuildNitfJpegData(blocks, NitfApp6Plan{4, 1, 0, 0}), 4);
     ASSERT_TRUE(image.opened);
-    EXPECT_EQ(image.decoder.app6[12] | (image.decoder.app6[13] << 8), 4);   // blocks per row, host order
+    EXPECT_EQ(image.decoder.app6[12] | (image.decoder.app6[13] << 8), 4); // blocks per row, host order
     for (unsigned i = 0; i < 4; ++i)
         EXPECT_EQ(image.Block(i), DecodeWithLibjpeg(blocks[i], 1)) << "block " << i;
-    EXPECT_FALSE(image.decoder.GetRow(4, 0, 0, kSide - 1, kSide, image.Block(0).data()));
+    const Bytes full = image.Block(1);
+    Bytes span(40, 0xEE);
+    EXPECT_FALSE(image.decoder.GetRow(4, 0, 0, kSide - 1, kSide, span.data()));
+    // Columns 10 to 15 of row 5: six bytes asked, the rest untouched; more asked: only what is there.
+    for (uint32_t asked : {6u, 40u}) {
+        ASSERT_TRUE(image.decoder.GetRow(1, 5, 10, 15, asked, span.data()));
+        EXPECT_EQ(Bytes(span.begin(), span.begin() + 6), Bytes(full.begin() + 5 * kSide + 10, full.begin() + 6 * kSide));
+        EXPECT_EQ(span[6], 0xEE);
+    }
+    EXPECT_FALSE(image.decoder.GetRow(0, kSide, 0, 0, 1, span.data()));
+    EXPECT_FALSE(image.decoder.GetRow(0, 0, kSide, kSide, 1, span.data()));
 }
 
 TEST(JpegDecode, MissingTablesAreTakenFromTheQualityByte)
 {
-    Bytes pattern = TestPattern(kSide, kSide, 1, 7);
+    const Bytes pattern = TestPattern(kSide, kSide, 1, 7);
     JpegBlockPlan withTables;
     withTables.defaultQuality = 3;
-    Bytes complete = EncodeJpegBlock(pattern, withTables);
-    Bytes expected = OpenedJpeg(BuildNitfJpegData({complete}, {}), 1).Block(0);
-    EXPECT_EQ(expected, DecodeWithLibjpeg(complete, 1));
-
+    const Bytes complete = EncodeJpegBlock(pattern, withTables);
+    const Bytes expected = DecodeWithLibjpeg(complete, 1);
+    EXPECT_EQ(OpenedJpeg(BuildNitfJpegData({complete}, {}), 1).Block(0), expected);
     for (auto [keepDqt, keepDht] : {std::pair{false, false}, {false, true}, {true, false}}) {
         JpegBlockPlan bare = withTables;
         bare.keepDqt = keepDqt;
         bare.keepDht = keepDht;
-        Bytes data = BuildNitfJpegData({EncodeJpegBlock(pattern, bare)}, NitfApp6Plan {1, 1, 3, 0});
+        Bytes data = BuildNitfJpegData({EncodeJpegBlock(pattern, bare)}, NitfApp6Plan{1, 1, 3, 0});
         OpenedJpeg image(data, 1);
         ASSERT_TRUE(image.opened) << keepDqt << keepDht;
         EXPECT_EQ(image.Block(0), expected);
-
-        // Without a quality there is no default DQT; a DHT alone needs none.
-        data[2 + 20] = 0;
-        OpenedJpeg unqualified(data, 1);
-        EXPECT_EQ(unqualified.opened, keepDqt) << keepDqt << keepDht;
+        data[2 + 20] = 0; // without a quality there is no default DQT; a DHT alone needs none
+        EXPECT_EQ(OpenedJpeg(data, 1).opened, keepDqt) << keepDqt << keepDht;
     }
 }
 
@@ -103,8 +149,8 @@ TEST(JpegDecode, LastBlockWithoutEndOfImageIsDamaged)
 {
     JpegBlockPlan open;
     open.keepEoi = false;
-    Bytes pattern = TestPattern(kSide, kSide, 1, 1);
-    Bytes data = BuildNitfJpegData({EncodeJpegBlock(pattern, {}), EncodeJpegBlock(pattern, open)}, {});
+    const Bytes pattern = TestPattern(kSide, kSide, 1, 1);
+    const Bytes data = BuildNitfJpegData({EncodeJpegBlock(pattern, {}), EncodeJpegBlock(pattern, open)}, {});
     DecoderTestFile file(data);
     CLeadToolLibWrapper decoder;
     ASSERT_TRUE(decoder.PrepareJpeg(file.reader, kTestDataOffset, 0, 8));
@@ -122,97 +168,58 @@ TEST(JpegDecode, LastBlockWithoutEndOfImageIsDamaged)
     EXPECT_FALSE(decoder.GetRow(0, 0, 0, kSide - 1, kSide, row.data()));
 }
 
-TEST(JpegDecode, ColourReachesTheCallerAsRgb)
+TEST(JpegDecode, HostileStreamsAreRefusedOrFailCleanly)
 {
-    Bytes pattern = TestPattern(kSide, kSide, 3, 2);
-    for (bool rgbCoding : {false, true}) {
-        JpegBlockPlan plan;
-        plan.components = 3;
-        plan.rgbCoding = rgbCoding;
-        Bytes block = EncodeJpegBlock(pattern, plan);
-        OpenedJpeg image(BuildNitfJpegData({block}, NitfApp6Plan {1, 1, 0, uint8_t(rgbCoding ? 1 : 2)}), 1, 3);
-        ASSERT_TRUE(image.opened);
-        EXPECT_EQ(image.decoder.loaderConverted, 1);
-        EXPECT_EQ(image.Block(0, 3), DecodeWithLibjpeg(block, 3)) << "R,G,B coding " << rgbCoding;
-    }
-}
-
-TEST(JpegDecode, RowSpansStayWithinTheCallersBytes)
-{
-    Bytes data = BuildNitfJpegData({EncodeJpegBlock(TestPattern(kSide, kSide, 1, 3), {})}, {});
-    OpenedJpeg image(data, 1);
-    ASSERT_TRUE(image.opened);
-    Bytes full = image.Block(0);
-    Bytes span(12, 0xEE);
-    // Columns 10 to 15 of row 5: six bytes asked, the rest untouched.
-    ASSERT_TRUE(image.decoder.GetRow(0, 5, 10, 15, 6, span.data()));
-    EXPECT_EQ(Bytes(span.begin(), span.begin() + 6), Bytes(full.begin() + 5 * kSide + 10, full.begin() + 6 * kSide));
-    EXPECT_EQ(span[6], 0xEE);
-    // More bytes than the row holds from that column: only what is there.
-    Bytes wide(40, 0xEE);
-    ASSERT_TRUE(image.decoder.GetRow(0, 5, 10, 15, 40, wide.data()));
-    EXPECT_EQ(wide[6], 0xEE);
-    EXPECT_FALSE(image.decoder.GetRow(0, kSide, 0, 0, 1, wide.data()));
-    EXPECT_FALSE(image.decoder.GetRow(0, 0, kSide, kSide, 1, wide.data()));
-}
-
-TEST(JpegDecode, HostileStreamsFailCleanly)
-{
-    Bytes pattern = TestPattern(kSide, kSide, 1, 4);
-    // A frame larger than the block the caller gives.
+    const Bytes pattern = TestPattern(kSide, kSide, 1, 4);
+    const Bytes block = EncodeJpegBlock(pattern, {});
+    const auto withMarker = [](Bytes stream, uint8_t code, size_t at, uint8_t value) {
+        for (size_t i = 2; i + at < stream.size(); ++i)
+            if (stream[i] == 0xFF && stream[i + 1] == code) {
+                stream[i + at] = value;
+                break;
+            }
+        return stream;
+    };
+    // A frame larger than the block; 65535 x 65535 declared in a small stream.
     JpegBlockPlan large;
     large.width = large.height = 2 * kSide;
-    Bytes big = EncodeJpegBlock(TestPattern(2 * kSide, 2 * kSide, 1, 4), large);
-    EXPECT_FALSE(OpenedJpeg(BuildNitfJpegData({big}, {}), 1).opened);
-
-    // A frame header declaring 65535 x 65535 in a small stream, no block size given.
-    Bytes absurd = EncodeJpegBlock(pattern, {});
-    for (size_t at = 2; at + 8 < absurd.size(); ++at)
-        if (absurd[at] == 0xFF && absurd[at + 1] == 0xC0) {
-            absurd[at + 5] = absurd[at + 6] = absurd[at + 7] = absurd[at + 8] = 0xFF;
-            break;
-        }
-    {
-        Bytes data = BuildNitfJpegData({absurd}, {});
-        DecoderTestFile file(data);
-        CLeadToolLibWrapper decoder;
-        ASSERT_TRUE(decoder.PrepareJpeg(file.reader, kTestDataOffset, 0, 8));
-        EXPECT_FALSE(decoder.Open(file.reader, kTestDataOffset, 1, 0, 8, 1, kSide, kSide, false));
-    }
+    EXPECT_FALSE(OpenedJpeg(BuildNitfJpegData({EncodeJpegBlock(TestPattern(2 * kSide, 2 * kSide, 1, 4), large)}, {}), 1).opened);
+    Bytes absurd = block;
+    for (size_t at : {5, 6, 7, 8})
+        absurd = withMarker(absurd, 0xC0, at, 0xFF);
+    EXPECT_FALSE(OpenedJpeg(BuildNitfJpegData({absurd}, {}), 1).opened);
+    // Lossless: cut in half, or 12-bit samples.
+    const Bytes lossless = EncodeLosslessJpeg(pattern, LosslessJpegPlan{});
+    Bytes truncated(lossless.begin(), lossless.begin() + lossless.size() / 2);
+    truncated.insert(truncated.end(), {0xFF, 0xD9});
+    EXPECT_FALSE(OpenedJpeg(BuildNitfJpegData({truncated}, {}), 1).opened);
+    EXPECT_FALSE(OpenedJpeg(BuildNitfJpegData({withMarker(lossless, 0xC3, 4, 12)}, {}), 1).opened);
 
     // Entropy-coded data overwritten: whatever libjpeg makes of it, no crash and no hang.
-    Bytes corrupt = EncodeJpegBlock(pattern, {});
+    Bytes corrupt = block;
     for (size_t at = corrupt.size() - 40; at < corrupt.size() - 2; ++at)
         corrupt[at] = uint8_t(at * 97);
     OpenedJpeg damaged(BuildNitfJpegData({corrupt}, {}), 1);
     Bytes row(kSide);
-    if (damaged.opened) {
-        EXPECT_TRUE(damaged.decoder.GetRow(0, 0, 0, kSide - 1, kSide, row.data()));
-    }
+    EXPECT_TRUE(!damaged.opened || damaged.decoder.GetRow(0, 0, 0, kSide - 1, kSide, row.data()));
 
-    // More blocks than the data can hold: refused before anything is allocated.
-    Bytes one = BuildNitfJpegData({EncodeJpegBlock(pattern, {})}, {});
-    DecoderTestFile file(one);
-    CLeadToolLibWrapper decoder;
-    ASSERT_TRUE(decoder.PrepareJpeg(file.reader, kTestDataOffset, 0, 8));
-    EXPECT_FALSE(decoder.Open(file.reader, kTestDataOffset, 0xFFFFFFFF, 0, 8, 1, kSide, kSide, false));
-    EXPECT_EQ(decoder.bitmaps, nullptr);
-}
-
-TEST(JpegDecode, PreparationNeedsNitfApp6AndEightBitSamples)
-{
-    Bytes data = BuildNitfJpegData({EncodeJpegBlock(TestPattern(kSide, kSide, 1, 5), {})}, {});
+    // More blocks than the data can hold: refused before anything is allocated. Preparing needs the
+    // NITF APP6 segment at the data offset and 8-bit samples; opening needs a prepared decoder.
+    const Bytes data = BuildNitfJpegData({block}, {});
     DecoderTestFile file(data);
     CLeadToolLibWrapper decoder;
     EXPECT_FALSE(decoder.PrepareJpeg(file.reader, kTestDataOffset, 0, 12));
     EXPECT_FALSE(decoder.PrepareJpeg(file.reader, kTestDataOffset, 0, 16));
     EXPECT_FALSE(decoder.PrepareJpeg(file.reader, kTestDataOffset + 1, 0, 8));
     EXPECT_FALSE(decoder.Open(file.reader, kTestDataOffset, 1, 0, 8, 1, kSide, kSide, false));
-    EXPECT_TRUE(decoder.PrepareJpeg(file.reader, kTestDataOffset, 0, 8));
+    ASSERT_TRUE(decoder.PrepareJpeg(file.reader, kTestDataOffset, 0, 8));
     EXPECT_FALSE(decoder.Open(file.reader, kTestDataOffset, 1, 0, 12, 1, kSide, kSide, false));
-
+    CLeadToolLibWrapper huge;
+    ASSERT_TRUE(huge.PrepareJpeg(file.reader, kTestDataOffset, 0, 8));
+    EXPECT_FALSE(huge.Open(file.reader, kTestDataOffset, 0xFFFFFFFF, 0, 8, 1, kSide, kSide, false));
+    EXPECT_EQ(huge.bitmaps, nullptr);
     Bytes other = data;
-    other[2 + 4] = 'X';   // identifier "XITF"
+    other[2 + 4] = 'X'; // identifier "XITF"
     DecoderTestFile otherFile(other);
     CLeadToolLibWrapper otherDecoder;
     EXPECT_FALSE(otherDecoder.PrepareJpeg(otherFile.reader, kTestDataOffset, 0, 8));
@@ -232,57 +239,11 @@ TEST(JpegDecode, TableScanFindsTheFrameBehindAChunkBoundary)
     uint32_t insertAt = 0, length = 0;
     ASSERT_TRUE(decoder.ScanTableMarkers(file.reader, kTestDataOffset, hasDht, hasDqt, insertAt));
     EXPECT_TRUE(hasDqt);
-    EXPECT_FALSE(hasDht);   // libjpeg writes its DHT after the frame header
+    EXPECT_FALSE(hasDht); // libjpeg writes its DHT after the frame header
     EXPECT_EQ(block[insertAt], 0xFF);
     EXPECT_EQ(block[insertAt + 1], 0xC0);
     ASSERT_TRUE(decoder.FindEndOfImage(file.reader, kTestDataOffset, length));
     EXPECT_EQ(length, block.size());
 }
 
-TEST(LosslessJpeg, EveryPredictorRestoresTheSamples)
-{
-    Bytes grey = TestPattern(kSide, kSide, 1, 8);
-    Bytes colour = TestPattern(kSide, kSide, 3, 9);
-    for (int predictor = 1; predictor <= 7; ++predictor) {
-        for (int components : {1, 3}) {
-            LosslessJpegPlan plan;
-            plan.components = components;
-            plan.predictor = predictor;
-            plan.restartRows = predictor == 4 ? 4 : 0;
-            const Bytes& pixels = components == 1 ? grey : colour;
-            OpenedJpeg image(BuildNitfJpegData({EncodeLosslessJpeg(pixels, plan)}, {}), 1, components);
-            ASSERT_TRUE(image.opened) << predictor << " " << components;
-            EXPECT_EQ(image.Block(0, components), pixels) << predictor << " " << components;
-        }
-    }
-}
-
-TEST(LosslessJpeg, PointTransformDropsTheLowBits)
-{
-    Bytes pixels = TestPattern(kSide, kSide, 1, 10);
-    LosslessJpegPlan plan;
-    plan.predictor = 6;
-    plan.pointTransform = 2;
-    OpenedJpeg image(BuildNitfJpegData({EncodeLosslessJpeg(pixels, plan)}, {}), 1);
-    ASSERT_TRUE(image.opened);
-    for (uint8_t& value : pixels)
-        value &= 0xFC;
-    EXPECT_EQ(image.Block(0), pixels);
-}
-
-TEST(LosslessJpeg, TruncatedAndCorruptStreamsFail)
-{
-    Bytes stream = EncodeLosslessJpeg(TestPattern(kSide, kSide, 1, 11), LosslessJpegPlan {});
-    Bytes truncated(stream.begin(), stream.begin() + stream.size() / 2);
-    truncated.insert(truncated.end(), {0xFF, 0xD9});
-    EXPECT_FALSE(OpenedJpeg(BuildNitfJpegData({truncated}, {}), 1).opened);
-    Bytes twelveBit = stream;
-    for (size_t at = 2; at + 4 < twelveBit.size(); ++at)
-        if (twelveBit[at] == 0xFF && twelveBit[at + 1] == 0xC3) {
-            twelveBit[at + 4] = 12;
-            break;
-        }
-    EXPECT_FALSE(OpenedJpeg(BuildNitfJpegData({twelveBit}, {}), 1).opened);
-}
-
-}  // namespace
+} // namespace
