@@ -110,15 +110,9 @@ TEST(RpfFrames, WrittenFramesDecodeToTheirIndicesAsGdalDecodesThem)
         plan.corners = c.corners;
         OpenedFrame frame(BuildRpfFrame(plan));
         ASSERT_TRUE(frame.opened);
-        const CRpfFrameReader& reader = frame.reader;
-        EXPECT_EQ(reader.headerSection.bigEndian, c.bigEndian);
-        EXPECT_EQ(reader.imageSection.kernelWidth, 4);
-        EXPECT_EQ(reader.imageSection.kernelHeight, 4);
-        EXPECT_EQ(reader.imageSection.totalColumns, kRpfFrameSide);
-        EXPECT_EQ(reader.imageSection.totalRows, kRpfFrameSide);
-        EXPECT_EQ(reader.compressionSection.lookupTables.size(), 4u);
-        EXPECT_EQ(reader.coverage.southEastLatitude, c.corners.southEastLatitude);
-        EXPECT_EQ(reader.coverage.southEastLongitude, c.corners.southEastLongitude);
+        EXPECT_EQ(frame.reader.headerSection.bigEndian, c.bigEndian);
+        EXPECT_EQ(frame.reader.coverage.southEastLatitude, c.corners.southEastLatitude);
+        EXPECT_EQ(frame.reader.coverage.southEastLongitude, c.corners.southEastLongitude);
         const std::vector<uint8_t> pixels = frame.All();
         EXPECT_EQ(pixels, ExpectedRpfPixels(plan));
         // GDAL reads big-endian frames only; it takes the 216 records of the

@@ -7,6 +7,8 @@
 #include "tests/fixtures/RpfFrameWriter.h"
 #include "tests/fixtures/TempFiles.h"
 
+#include <gtest/gtest.h>
+
 #include <cstdint>
 #include <string>
 #include <vector>
@@ -23,9 +25,12 @@ struct OpenedFrame {
     // Columns first..last of a row in a draw of that width; empty when the line fails.
     std::vector<uint8_t> Line(uint32_t row, uint32_t first = 0, uint32_t last = kRpfFrameSide - 1)
     {
-        std::vector<uint8_t> line(last - first + 1);
+        std::vector<uint8_t> line(last - first + 2, 0xEE);
         reader.PrepareDraw(last - first + 1);
-        return reader.ReadLine(drawReader, row, first, last, line.data()) ? line : std::vector<uint8_t>();
+        const bool read = reader.ReadLine(drawReader, row, first, last, line.data());
+        EXPECT_EQ(line.back(), 0xEE) << "row " << row << ": wrote past column " << last;
+        line.pop_back();
+        return read ? line : std::vector<uint8_t>();
     }
     // Every row in one draw; empty when a line fails.
     std::vector<uint8_t> All()
