@@ -38,6 +38,17 @@ Bytes DecodeWithLibjpeg(const Bytes& stream, int components)
     return pixels;
 }
 
+// The stream with one byte set, at an offset from the first marker of the given code.
+Bytes SetAfterMarker(Bytes stream, uint8_t code, size_t at, uint8_t value)
+{
+    for (size_t i = 2; i + at < stream.size(); ++i)
+        if (stream[i] == 0xFF && stream[i + 1] == code) {
+            stream[i + at] = value;
+            break;
+        }
+    return stream;
+}
+
 // NITF JPEG data of blocks of kSide x kSide side by side, prepared and opened.
 struct OpenedJpeg {
     DecoderTestFile file;
@@ -66,8 +77,9 @@ TEST(JpegDecode, StreamsDecodeAsTheirReference)
     struct Case {
         std::string what;
         Bytes stream, expected;
-        int components;
-        uint8_t streamColor; // APP6: 0 grey, 1 R,G,B coded, 2 YCbCr coded
+        int components = 1;
+        uint8_t quality = 0, streamColor = 0; // APP6; colour: 0 grey, 1 R,G,B coded, 2 YCbCr coded
+        bool opens = true;
     };
     std::vector<Case> cases;
     const Bytes colour = TestPattern(kSide, kSide, 3, 2);
@@ -76,27 +88,69 @@ TEST(JpegDecode, StreamsDecodeAsTheirReference)
         plan.components = 3;
         plan.rgbCoding = rgbCoding;
         const Bytes stream = EncodeJpegBlock(colour, plan);
-        cases.push_back({rgbCoding ? "R,G,B coded" : "YCbCr coded", stream, DecodeWithLibjpeg(stream, 3), 3,
+        cases.push_back({rgbCoding ? "R,G,B coded" : "YCbCr coded", stream, DecodeWithLibjpeg(stream, 3), 3, 0,
                          uint8_t(rgbCoding ? 1 : 2)});
     }
     // Lossless: every predictor, grey and colour, restart intervals, a point transform dropping two low bits.
     for (int predictor = 1; predictor <= 7; ++predictor)
         for (int components : {1, 3}) {
-            LosslessJpegPlan plan;
+            JpegBlockPlan plan;
             plan.components = components;
             plan.predictor = predictor;
             plan.restartRows = predictor == 4 ? 4 : 0;
             plan.pointTransform = predictor == 6 && components == 1 ? 2 : 0;
             Bytes pixels = TestPattern(kSide, kSide, components, unsigned(predictor));
-            const Bytes stream = EncodeLosslessJpeg(pixels, plan);
+            const Bytes stream = EncodeJpegBlock(pixels, plan);
             for (uint8_t& value : pixels)
                 value &= uint8_t(0xFF << plan.pointTransform);
-            cases.push_back({"lossless predictor " + std::to_string(predictor), stream, pixels, components, 0});
+            cases.push_back({"lossless predictor " + std::to_string(predictor), stream, pixels, components});
         }
+    // Tables left out are the NITF defaults of the APP6 quality; without a quality only a DHT may be missing.
+    // A comment in front pushes the frame header past the first 100 bytes the table scan reads.
+    const Bytes grey = TestPattern(kSide, kSide, 1, 7);
+    Bytes comment = {0xFF, 0xFE, 0x00, 0x5F};
+    comment.resize(0x5F + 2, 'c');
+    for (bool commented : {false, true})
+        for (auto [keepDqt, keepDht] : {std::pair{true, true}, {false, false}, {false, true}, {true, false}}) {
+            JpegBlockPlan plan;
+            plan.defaultQuality = 3;
+            Bytes complete = EncodeJpegBlock(grey, plan);
+            plan.keepDqt = keepDqt;
+            plan.keepDht = keepDht;
+            Bytes stream = EncodeJpegBlock(grey, plan);
+            if (commented) {
+                complete.insert(complete.begin() + 2, comment.begin(), comment.end());
+                stream.insert(stream.begin() + 2, comment.begin(), comment.end());
+            }
+            const std::string what =
+                std::string(commented ? "commented, " : "") + (keepDqt ? "DQT " : "") + (keepDht ? "DHT" : "");
+            cases.push_back({what + " quality 3", stream, DecodeWithLibjpeg(complete, 1), 1, 3});
+            cases.push_back({what + " no quality", stream, DecodeWithLibjpeg(complete, 1), 1, 0, 0, keepDqt});
+        }
+    // Refused: a frame larger than the block, 65535 x 65535 declared in a small stream, lossless
+    // streams cut in half or of 12-bit samples.
+    JpegBlockPlan large, lossless;
+    large.width = large.height = 2 * kSide;
+    lossless.predictor = 1;
+    const Bytes losslessStream = EncodeJpegBlock(grey, lossless);
+    Bytes halfLossless(losslessStream.begin(), losslessStream.begin() + losslessStream.size() / 2);
+    halfLossless.insert(halfLossless.end(), {0xFF, 0xD9});
+    Bytes absurd = EncodeJpegBlock(grey, {});
+    for (size_t at : {5, 6, 7, 8})
+        absurd = SetAfterMarker(absurd, 0xC0, at, 0xFF);
+    for (const auto& [what, stream] : {std::pair{"a frame larger than the block",
+                                                 EncodeJpegBlock(TestPattern(2 * kSide, 2 * kSide, 1, 4), large)},
+                                       {"65535 x 65535", absurd}, {"lossless, cut in half", halfLossless},
+                                       {"lossless, 12-bit samples", SetAfterMarker(losslessStream, 0xC3, 4, 12)}})
+        cases.push_back({what, stream, {}, 1, 0, 0, false});
     for (const Case& c : cases) {
-        OpenedJpeg image(BuildNitfJpegData({c.stream}, NitfApp6Plan{1, 1, 0, c.streamColor}), 1, uint32_t(c.components));
-        ASSERT_TRUE(image.opened) << c.what << ", " << c.components << " components";
-        EXPECT_EQ(image.Block(0, uint32_t(c.components)), c.expected) << c.what << ", " << c.components << " components";
+        OpenedJpeg image(BuildNitfJpegData({c.stream}, NitfApp6Plan{1, 1, c.quality, c.streamColor}), 1,
+                         uint32_t(c.components));
+        ASSERT_EQ(image.opened, c.opens) << c.what << ", " << c.components << " components";
+        if (!c.opens)
+            continue;
+        EXPECT_EQ(image.Block(0, uint32_t(c.components)), c.expected)
+            << c.what << ", " << c.components << " components";
         EXPECT_EQ(image.decoder.loaderConverted, c.components == 3 ? 1 : 0) << c.what;
     }
 }
@@ -117,32 +171,12 @@ TEST(JpegDecode, BlocksAndSpansStayWithinWhatTheCallerAsked)
     // Columns 10 to 15 of row 5: six bytes asked, the rest untouched; more asked: only what is there.
     for (uint32_t asked : {6u, 40u}) {
         ASSERT_TRUE(image.decoder.GetRow(1, 5, 10, 15, asked, span.data()));
-        EXPECT_EQ(Bytes(span.begin(), span.begin() + 6), Bytes(full.begin() + 5 * kSide + 10, full.begin() + 6 * kSide));
+        EXPECT_EQ(Bytes(span.begin(), span.begin() + 6),
+                  Bytes(full.begin() + 5 * kSide + 10, full.begin() + 6 * kSide));
         EXPECT_EQ(span[6], 0xEE);
     }
     EXPECT_FALSE(image.decoder.GetRow(0, kSide, 0, 0, 1, span.data()));
     EXPECT_FALSE(image.decoder.GetRow(0, 0, kSide, kSide, 1, span.data()));
-}
-
-TEST(JpegDecode, MissingTablesAreTakenFromTheQualityByte)
-{
-    const Bytes pattern = TestPattern(kSide, kSide, 1, 7);
-    JpegBlockPlan withTables;
-    withTables.defaultQuality = 3;
-    const Bytes complete = EncodeJpegBlock(pattern, withTables);
-    const Bytes expected = DecodeWithLibjpeg(complete, 1);
-    EXPECT_EQ(OpenedJpeg(BuildNitfJpegData({complete}, {}), 1).Block(0), expected);
-    for (auto [keepDqt, keepDht] : {std::pair{false, false}, {false, true}, {true, false}}) {
-        JpegBlockPlan bare = withTables;
-        bare.keepDqt = keepDqt;
-        bare.keepDht = keepDht;
-        Bytes data = BuildNitfJpegData({EncodeJpegBlock(pattern, bare)}, NitfApp6Plan{1, 1, 3, 0});
-        OpenedJpeg image(data, 1);
-        ASSERT_TRUE(image.opened) << keepDqt << keepDht;
-        EXPECT_EQ(image.Block(0), expected);
-        data[2 + 20] = 0; // without a quality there is no default DQT; a DHT alone needs none
-        EXPECT_EQ(OpenedJpeg(data, 1).opened, keepDqt) << keepDqt << keepDht;
-    }
 }
 
 TEST(JpegDecode, LastBlockWithoutEndOfImageIsDamaged)
@@ -168,33 +202,9 @@ TEST(JpegDecode, LastBlockWithoutEndOfImageIsDamaged)
     EXPECT_FALSE(decoder.GetRow(0, 0, 0, kSide - 1, kSide, row.data()));
 }
 
-TEST(JpegDecode, HostileStreamsAreRefusedOrFailCleanly)
+TEST(JpegDecode, CorruptDataAndDecodersNotPreparedFailCleanly)
 {
-    const Bytes pattern = TestPattern(kSide, kSide, 1, 4);
-    const Bytes block = EncodeJpegBlock(pattern, {});
-    const auto withMarker = [](Bytes stream, uint8_t code, size_t at, uint8_t value) {
-        for (size_t i = 2; i + at < stream.size(); ++i)
-            if (stream[i] == 0xFF && stream[i + 1] == code) {
-                stream[i + at] = value;
-                break;
-            }
-        return stream;
-    };
-    // A frame larger than the block; 65535 x 65535 declared in a small stream.
-    JpegBlockPlan large;
-    large.width = large.height = 2 * kSide;
-    EXPECT_FALSE(OpenedJpeg(BuildNitfJpegData({EncodeJpegBlock(TestPattern(2 * kSide, 2 * kSide, 1, 4), large)}, {}), 1).opened);
-    Bytes absurd = block;
-    for (size_t at : {5, 6, 7, 8})
-        absurd = withMarker(absurd, 0xC0, at, 0xFF);
-    EXPECT_FALSE(OpenedJpeg(BuildNitfJpegData({absurd}, {}), 1).opened);
-    // Lossless: cut in half, or 12-bit samples.
-    const Bytes lossless = EncodeLosslessJpeg(pattern, LosslessJpegPlan{});
-    Bytes truncated(lossless.begin(), lossless.begin() + lossless.size() / 2);
-    truncated.insert(truncated.end(), {0xFF, 0xD9});
-    EXPECT_FALSE(OpenedJpeg(BuildNitfJpegData({truncated}, {}), 1).opened);
-    EXPECT_FALSE(OpenedJpeg(BuildNitfJpegData({withMarker(lossless, 0xC3, 4, 12)}, {}), 1).opened);
-
+    const Bytes block = EncodeJpegBlock(TestPattern(kSide, kSide, 1, 4), {});
     // Entropy-coded data overwritten: whatever libjpeg makes of it, no crash and no hang.
     Bytes corrupt = block;
     for (size_t at = corrupt.size() - 40; at < corrupt.size() - 2; ++at)
@@ -224,26 +234,6 @@ TEST(JpegDecode, HostileStreamsAreRefusedOrFailCleanly)
     CLeadToolLibWrapper otherDecoder;
     EXPECT_FALSE(otherDecoder.PrepareJpeg(otherFile.reader, kTestDataOffset, 0, 8));
     EXPECT_EQ(otherDecoder.kind, kNotPrepared);
-}
-
-TEST(JpegDecode, TableScanFindsTheFrameBehindAChunkBoundary)
-{
-    // A comment pushes the frame header across the first 100-byte read.
-    Bytes block = EncodeJpegBlock(TestPattern(kSide, kSide, 1, 6), {});
-    Bytes comment = {0xFF, 0xFE, 0x00, 0x5F};
-    comment.resize(0x5F + 2, 'c');
-    block.insert(block.begin() + 2, comment.begin(), comment.end());
-    DecoderTestFile file(block);
-    CLeadToolLibWrapper decoder;
-    bool hasDht = false, hasDqt = false;
-    uint32_t insertAt = 0, length = 0;
-    ASSERT_TRUE(decoder.ScanTableMarkers(file.reader, kTestDataOffset, hasDht, hasDqt, insertAt));
-    EXPECT_TRUE(hasDqt);
-    EXPECT_FALSE(hasDht); // libjpeg writes its DHT after the frame header
-    EXPECT_EQ(block[insertAt], 0xFF);
-    EXPECT_EQ(block[insertAt + 1], 0xC0);
-    ASSERT_TRUE(decoder.FindEndOfImage(file.reader, kTestDataOffset, length));
-    EXPECT_EQ(length, block.size());
 }
 
 } // namespace

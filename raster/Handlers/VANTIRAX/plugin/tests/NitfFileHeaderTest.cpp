@@ -42,61 +42,42 @@ TEST(FieldNumbers, ConvertLikeAtolWithinWidth)
     EXPECT_DOUBLE_EQ(FieldToDouble(std::string(32, '1').c_str(), 32), 0.0);
 }
 
-TEST(NitfFileHeader, Nitf21WithEverySegmentGroup)
+// Both versions with and without a downgrade event, every segment group,
+// extended header data: the image segments are where the header says.
+TEST(NitfFileHeader, SegmentGroupsOfBothVersions)
 {
-    NitfFilePlan plan = OneImage();
-    plan.images.push_back({"ab", "cdef"});
-    plan.graphics.push_back({std::string(258, 'g'), "graphic"});
-    plan.texts.push_back({std::string(282, 't'), "hello"});
-    plan.dataExtensions.push_back({std::string(200, 'd'), "des"});
-    plan.reservedExtensions.push_back({std::string(200, 'r'), "res"});
-    plan.extendedHeaderData = Tre("XTRA01", "xyz");
-    ParsedHeader file(BuildNitfFile(plan));
-    ASSERT_TRUE(file.parsed);
-    const CNitfFileHeader& h = file.header;
-    EXPECT_EQ(h.version21, 1);
-    EXPECT_EQ(h.fixedLayout, 1);
-    EXPECT_EQ(h.HL, NitfHeaderLength(plan));
-    ASSERT_EQ(h.NUMI, 2);
-    EXPECT_EQ(h.imageSegments[0].subheaderLength, 300u);
-    EXPECT_EQ(h.imageSegments[0].dataLength, 1000u);
-    EXPECT_EQ(h.imageSegments[1].dataLength, 4u);
-    ASSERT_EQ(h.NUMS, 1);
-    EXPECT_EQ(h.graphicSegments[0].dataLength, 7u);
-    EXPECT_EQ(h.NUML, 0);
-    EXPECT_EQ(h.labelSegments, nullptr);
-    ASSERT_EQ(h.NUMT, 1);
-    EXPECT_EQ(h.textSegments[0].subheaderLength, 282u);
-    EXPECT_EQ(h.NUMDES, 1);
-    ASSERT_EQ(h.NUMRES, 1);
-    EXPECT_EQ(h.resSegments[0].dataLength, 3u);
-    EXPECT_EQ(h.UDHDL, 0);
-    EXPECT_EQ(h.userHeaderOffset, kNoUserHeader);
-    EXPECT_EQ(h.XHDL, 3 + 11 + 3);
-    ASSERT_NE(h.XHD, nullptr);
-    EXPECT_EQ(std::string(reinterpret_cast<char*>(h.XHD), 6), "XTRA01");
-    // No image segments at all still parses.
-    ParsedHeader none(BuildNitfFile(NitfFilePlan{}));
+    for (bool version21 : {true, false})
+        for (bool event : {false, true}) {
+            NitfFilePlan plan = OneImage(version21);
+            plan.downgradeEvent = event;
+            plan.images.push_back({"ab", "cdef"});
+            plan.graphics.push_back({std::string(258, 'g'), "graphic"});
+            plan.labels.push_back({std::string(320, 'l'), "label"});
+            plan.texts.push_back({std::string(282, 't'), "hello"});
+            plan.dataExtensions.push_back({std::string(200, 'd'), "des"});
+            plan.reservedExtensions.push_back({std::string(200, 'r'), "res"});
+            plan.extendedHeaderData = Tre("XTRA01", "xyz");
+            ParsedHeader file(BuildNitfFile(plan));
+            ASSERT_TRUE(file.parsed) << version21 << event;
+            const CNitfFileHeader& h = file.header;
+            EXPECT_EQ(h.version21, version21 ? 1 : 0);
+            EXPECT_EQ(h.fixedLayout, event && !version21 ? 0 : 1);
+            EXPECT_EQ(h.HL, NitfHeaderLength(plan));
+            ASSERT_EQ(h.NUMI, 2);
+            EXPECT_EQ(h.imageSegments[0].subheaderLength, 300u);
+            EXPECT_EQ(h.imageSegments[0].dataLength, 1000u);
+            EXPECT_EQ(h.imageSegments[1].subheaderLength + h.imageSegments[1].dataLength, 6u);
+            EXPECT_EQ(std::vector<int>({h.NUMS, h.NUML, h.NUMT, h.NUMDES, h.NUMRES}), std::vector<int>(5, 1));
+            EXPECT_EQ(h.UDHDL, 0);
+            EXPECT_EQ(h.userHeaderOffset, kNoUserHeader);
+            EXPECT_EQ(h.XHDL, 3 + 11 + 3);
+            ASSERT_NE(h.XHD, nullptr);
+            EXPECT_EQ(std::string(reinterpret_cast<char*>(h.XHD), 6), "XTRA01");
+        }
+    ParsedHeader none(BuildNitfFile(NitfFilePlan{})); // no segments at all still parses
     ASSERT_TRUE(none.parsed);
     EXPECT_EQ(none.header.NUMI, 0);
     EXPECT_EQ(none.header.imageSegments, nullptr);
-}
-
-TEST(NitfFileHeader, Nitf20WithAndWithoutDowngradeEvent)
-{
-    NitfFilePlan plan = OneImage(false);
-    plan.labels.push_back({std::string(320, 'l'), "label"});
-    for (bool event : {false, true}) {
-        plan.downgradeEvent = event;
-        ParsedHeader file(BuildNitfFile(plan));
-        ASSERT_TRUE(file.parsed);
-        EXPECT_EQ(file.header.version21, 0);
-        EXPECT_EQ(file.header.fixedLayout, event ? 0 : 1);
-        EXPECT_EQ(file.header.HL, NitfHeaderLength(plan));
-        ASSERT_EQ(file.header.NUML, 1);
-        EXPECT_EQ(file.header.labelSegments[0].dataLength, 5u);
-        EXPECT_EQ(file.header.graphicSegments, nullptr);
-    }
 }
 
 // An RPF header is user-defined header data of exactly 62 bytes (an RPFHDR
