@@ -41,7 +41,8 @@ TEST(ImageCorners, EachFormGivesItsCornersAndCode)
         {'D', "+32.984+085.000+32.984+085.001+32.983+085.001+32.983+085.000", true,
          {85.0, 32.984, 85.001, 32.984, 85.0, 32.983}, 4326},
         // Non-numbers ("nan", "inf") read as no number: 0.
-        {'D', Igeolo("+12.345-123.456", "-00.500+000.250", "+nan   +inf    "), true, {-123.456, 12.345, 0.25, -0.5, 0, 0}, 4326},
+        {'D', Igeolo("+12.345-123.456", "-00.500+000.250", "+nan   +inf    "), true,
+         {-123.456, 12.345, 0.25, -0.5, 0, 0}, 4326},
         {'N', utm, true, utmCorners, 32645},
         {'S', utm, true, utmCorners, 32745},
         {'N', "00" + utm.substr(2), true, utmCorners, 0}, // zones outside 1-60 have no code, the metres pass

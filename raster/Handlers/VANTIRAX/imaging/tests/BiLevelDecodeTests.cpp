@@ -68,7 +68,8 @@ TEST(BiLevelDecode, CorruptOrShortStripsFailCleanly)
     DecoderTestFile file(strip);
     CLeadToolLibWrapper decoder;
     ASSERT_TRUE(decoder.PrepareBiLevel());
-    EXPECT_FALSE(decoder.Open(file.reader, kTestDataOffset, 1, uint32_t(strip.size()) + 1, 1, 1, kWidth, kHeight, false));
+    EXPECT_FALSE(
+        decoder.Open(file.reader, kTestDataOffset, 1, uint32_t(strip.size()) + 1, 1, 1, kWidth, kHeight, false));
     decoder.FreeBitmaps();
     EXPECT_FALSE(decoder.Open(file.reader, kTestDataOffset, 1, uint32_t(strip.size()), 1, 1, kWidth,
                               uint32_t(strip.size()) * 8 + 8, false));

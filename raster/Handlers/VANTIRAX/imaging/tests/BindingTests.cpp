@@ -21,7 +21,8 @@ struct TrimmedModules {
         const ImagingModuleTable& builtIn = BuiltInImagingModules();
         for (size_t m = 0; m < builtIn.moduleCount; ++m) {
             const ImagingModule& module = builtIn.modules[m];
-            std::vector<ImagingEntry>& entries = std::strcmp(module.name, kKernelModuleName) == 0 ? kernelEntries : fileEntries;
+            const bool kernel = std::strcmp(module.name, kKernelModuleName) == 0;
+            std::vector<ImagingEntry>& entries = kernel ? kernelEntries : fileEntries;
             for (size_t e = 0; e < module.entryCount; ++e)
                 if (missingEntry == nullptr || std::strcmp(module.entries[e].name, missingEntry) != 0)
                     entries.push_back(module.entries[e]);

@@ -22,7 +22,7 @@ void CheckAgainstGdal(const char* name, const NitfImagePlan& source, const std::
 {
     SCOPED_TRACE(std::string(name) + " " + options);
     TempDirectory dir;
-    const uint64_t limit = source.NBPP == 16 ? 2048 : source.bands[0].NELUT != 0 ? uint64_t(source.bands[0].NELUT) : 256;
+    const uint64_t limit = source.NBPP == 16 ? 2048 : source.bands[0].NELUT ? uint64_t(source.bands[0].NELUT) : 256;
     const PixelValue pixel = [&](int32_t band, int32_t row, int32_t column) {
         return uint64_t(band * 100 + row * 7 + column * 3) * 13 % limit;
     };

@@ -54,8 +54,9 @@ TEST(Image, EveryLayoutDrawsThePixelsWritten)
                 plan.comments.assign(subheaderEvent ? 2 : 0, "comment");
                 plan.padding = subheaderEvent ? "PAD" : ""; // bytes after the last field, counted in LISH
                 plan.UDID = plan.IXSHD = subheaderEvent ? "extension data" : "";
-                cases.push_back({"NITF 2." + std::string(version21 ? "1" : "0") + (subheaderEvent ? " with ISDEVT" : "") +
-                                     " ICORDS '" + ICORDS + "'", plan, {}, !version21 && ICORDS == 'N'});
+                const std::string what = std::string(version21 ? "NITF 2.1" : "NITF 2.0") +
+                                         (subheaderEvent ? " with ISDEVT" : "") + " ICORDS '" + ICORDS + "'";
+                cases.push_back({what, plan, {}, !version21 && ICORDS == 'N'});
             }
     for (const Case& c : cases) {
         const NitfImagePlan& plan = c.plan;
@@ -72,9 +73,11 @@ TEST(Image, EveryLayoutDrawsThePixelsWritten)
         EXPECT_EQ(loaded.image.IGEOLO != nullptr, plan.ICORDS == 'N' && plan.version21) << c.what;
         // IMDATOFF: the mask table's 10-byte header, the 8-bit pad pixel code and a record per block.
         const uint32_t maskTable = plan.IC == "NM" ? uint32_t(10 + 1 + 4 * blocks.size()) : 0;
-        EXPECT_EQ(loaded.image.dataOffset, loaded.header.HL + loaded.header.imageSegments[0].subheaderLength + maskTable);
+        const uint32_t subheaderEnd = loaded.header.HL + loaded.header.imageSegments[0].subheaderLength;
+        EXPECT_EQ(loaded.image.dataOffset, subheaderEnd + maskTable) << c.what;
         const int32_t bands = int32_t(plan.bands.size());
-        const int32_t blockWidth = plan.NPPBH ? plan.NPPBH : plan.columns, blockHeight = plan.NPPBV ? plan.NPPBV : plan.rows;
+        const int32_t blockWidth = plan.NPPBH ? plan.NPPBH : plan.columns;
+        const int32_t blockHeight = plan.NPPBV ? plan.NPPBV : plan.rows;
         for (int32_t row = 0; row < plan.rows; ++row) {
             std::vector<uint8_t> expected;
             for (int32_t column = 0; column < plan.columns; ++column)
@@ -185,7 +188,8 @@ TEST(Image, RefusesWhatTheFileCannotBackAndWhatIsNotServed)
     ASSERT_TRUE(loaded.Open());
     std::vector<uint8_t> out(64, 0xEE);
     for (const auto& [row, first, last] : {std::tuple{5, 0, 6}, {0, 0, 7}, {0, -1, 3}, {0, 4, 3}})
-        EXPECT_FALSE(loaded.image.ReadLine(loaded.reader, uint32_t(row), first, last, out.data())) << row << first << last;
+        EXPECT_FALSE(loaded.image.ReadLine(loaded.reader, uint32_t(row), first, last, out.data()))
+            << row << " " << first << ".." << last;
     EXPECT_EQ(out, std::vector<uint8_t>(64, 0xEE));
 
     // Layouts the reader cannot address safely are refused when the data is prepared.
@@ -222,7 +226,8 @@ TEST(Image, RefusesWhatTheFileCannotBackAndWhatIsNotServed)
         NitfImagePlan plan = good;
         c.change(plan);
         LoadedImage image(BuildImageFile(plan, c.data));
-        EXPECT_EQ(image.Parse() && image.image.PrepareData(image.reader, uint32_t(c.data.size())), c.prepares) << c.what;
+        EXPECT_EQ(image.Parse() && image.image.PrepareData(image.reader, uint32_t(c.data.size())), c.prepares)
+            << c.what;
     }
 }
 

@@ -9,6 +9,8 @@
 #include "tests/fixtures/NitfFileWriter.h"
 #include "tests/fixtures/TempFiles.h"
 
+#include <gtest/gtest.h>
+
 #include <algorithm>
 #include <cstdlib>
 #include <string>
@@ -43,8 +45,11 @@ struct LoadedImage {
     std::vector<uint8_t> Row(uint32_t row, int32_t first = 0, int32_t last = -1)
     {
         last = last < 0 ? image.NCOLS - 1 : last;
-        std::vector<uint8_t> out(size_t(last - first + 1) * (image.NBANDS == 3 ? 3 : 1), 0xEE);
-        return image.ReadLine(reader, row, first, last, out.data()) ? out : std::vector<uint8_t>();
+        std::vector<uint8_t> out(size_t(last - first + 1) * (image.NBANDS == 3 ? 3 : 1) + 1, 0xEE);
+        const bool read = image.ReadLine(reader, row, first, last, out.data());
+        EXPECT_EQ(out.back(), 0xEE) << "row " << row << ": wrote past column " << last;
+        out.pop_back();
+        return read ? out : std::vector<uint8_t>();
     }
 
     TempFile file{std::string(), ".ntf"};

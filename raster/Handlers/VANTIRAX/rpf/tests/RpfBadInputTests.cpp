@@ -65,7 +65,8 @@ TEST(RpfBadInput, RefusedAtOpenOrOnlyTheLinesTheDamageMeets)
         {"kernel width 0", {{&L::imageDescription, 12, 2, 4}}, false},
         {"kernel height 0", {{&L::imageDescription, 16, 3, 4}}, false},
         {"part kernels", {{&L::imageDescription, 12, 258, 4}}, false},
-        {"mask table of 65535 x 65535", {{&L::imageDescription, 8, 0xFFFF, 2}, {&L::imageDescription, 10, 0xFFFF, 2}}, false},
+        {"mask table of 65535 x 65535",
+         {{&L::imageDescription, 8, 0xFFFF, 2}, {&L::imageDescription, 10, 0xFFFF, 2}}, false},
         {"location section past the file", {{&L::headerSection, 44, fileSize + 8, 4}}, false},
         {"coverage past the file", {{&L::locationSection, kCoverageRecord + 6, fileSize - 50, 4}}, false},
         {"coverage at 0xFFFFFFF0", {{&L::locationSection, kCoverageRecord + 6, 0xFFFFFFF0, 4}}, false},
@@ -102,8 +103,10 @@ TEST(RpfBadInput, RefusedAtOpenOrOnlyTheLinesTheDamageMeets)
              for (uint32_t column = 2; column < 256 && !row.empty(); column += 4)
                  ASSERT_EQ(row[column] + row[column + 1], 2 * kRpfMaskedPixel) << column;
          }},
-        {"8 values a record", {{&L::lookupSubsection, Lookup(2, 6), 8, 2}}, true, {{6, 0, 1535, false}, {7, 0, 1535, true}}},
-        {"16-bit values", {{&L::lookupSubsection, Lookup(3, 8), 16, 2}}, true, {{3, 0, 1535, false}, {4, 0, 1535, true}}},
+        {"8 values a record", {{&L::lookupSubsection, Lookup(2, 6), 8, 2}}, true,
+         {{6, 0, 1535, false}, {7, 0, 1535, true}}},
+        {"16-bit values", {{&L::lookupSubsection, Lookup(3, 8), 16, 2}}, true,
+         {{3, 0, 1535, false}, {4, 0, 1535, true}}},
         // 4-bit values: a masked code fills only the kernel (subframe 3), not the wider record.
         {"4-bit values", {{&L::lookupSubsection, Lookup(0, 6), 8, 2}, {&L::lookupSubsection, Lookup(0, 8), 4, 2}}, true,
          {{0, 768, 1000, true}, {0, 0, 10, false}}},
@@ -115,8 +118,8 @@ TEST(RpfBadInput, RefusedAtOpenOrOnlyTheLinesTheDamageMeets)
         {"no colour tables", {{&L::colorGraySubheader, 0, 0, 1}}, true, {{0, 0, 1535, true}},
          [](OpenedFrame& opened) {
              uint8_t grey = 0;
-             EXPECT_FALSE(opened.reader.colorGraySection.IsColorTable() || opened.reader.colorGraySection.IsGrayTable());
-             EXPECT_FALSE(opened.reader.colorGraySection.GetPaletteGray(0, grey));
+             RpfColorGraySection& colors = opened.reader.colorGraySection;
+             EXPECT_FALSE(colors.IsColorTable() || colors.IsGrayTable() || colors.GetPaletteGray(0, grey));
          }},
     };
     for (const Case& c : cases) {
@@ -127,8 +130,8 @@ TEST(RpfBadInput, RefusedAtOpenOrOnlyTheLinesTheDamageMeets)
         ASSERT_EQ(opened.opened, c.opens) << c.what;
         for (const Line& line : c.lines) {
             const auto from = expected.begin() + line.row * kRpfFrameSide;
-            EXPECT_EQ(opened.Line(line.row, line.first, line.last),
-                      line.decodes ? std::vector<uint8_t>(from + line.first, from + line.last + 1) : std::vector<uint8_t>())
+            const std::vector<uint8_t> undamaged(from + line.first, from + line.last + 1);
+            EXPECT_EQ(opened.Line(line.row, line.first, line.last), line.decodes ? undamaged : std::vector<uint8_t>())
                 << c.what << ": row " << line.row << " columns " << line.first << ".." << line.last;
         }
         if (c.alsoCheck)

@@ -64,7 +64,8 @@ bool MatchesGdal(OpenedFrame& ours, const std::string& path, const std::vector<u
     EXPECT_GE(entries.size(), 4u * kRpfMaskedPixel);
     for (uint32_t i = 0; i < kRpfMaskedPixel && 4 * i + 2 < entries.size(); ++i) {
         uint8_t red = 0, green = 0, blue = 0;
-        EXPECT_TRUE(colors.IsColorTable() ? colors.GetPaletteColor(i, red, green, blue) : colors.GetPaletteGray(i, red));
+        EXPECT_TRUE(colors.IsColorTable() ? colors.GetPaletteColor(i, red, green, blue)
+                                          : colors.GetPaletteGray(i, red));
         if (!colors.IsColorTable())
             green = blue = red;
         EXPECT_EQ((std::vector<double>{double(red), double(green), double(blue)}),
