@@ -1,8 +1,9 @@
-// What GDAL reads of a file (gdalinfo -json -checksum) and what the stand-in
-// host reports of an opened file (rhlhost info), picked out of their JSON.
+// GDAL as the judge: what it reads of a file (gdalinfo -json -checksum), the
+// samples it decodes (gdal_translate), and its checksum over one band.
 #pragma once
 
 #include <array>
+#include <cstddef>
 #include <cstdint>
 #include <string>
 #include <vector>
@@ -24,15 +25,8 @@ struct GdalReport {
 };
 
 GdalReport ReadWithGdal(const std::string& path);
-
-// GDAL's band checksums of a headerless file of 8-bit pixels (bands interleaved
-// by pixel), read through an ENVI header written beside it.
-std::vector<uint32_t> RawChecksums(const std::string& rawPath, uint32_t width, uint32_t height, unsigned bands);
-
-struct HostInfo {
-    int epsg = 0;
-    std::vector<std::array<double, 4>> points; // column, row, x, y
-    std::vector<std::array<int, 3>> palette;
-};
-
-HostInfo ReadHostInfo(const std::string& path);
+// The samples GDAL decodes, band sequential, after gdal_translate OPTIONS.
+std::string GdalSamples(const std::string& path, const std::string& options = "");
+// GDAL's checksum of one band of 8-bit pixels `stride` bytes apart: values
+// modulo a cycle of primes, summed, kept to 16 bits at the end of each row.
+uint32_t GdalChecksum(const uint8_t* pixels, uint32_t width, uint32_t height, size_t stride = 1);

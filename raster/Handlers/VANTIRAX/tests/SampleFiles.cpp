@@ -1,0 +1,209 @@
+#include "tests/SampleFiles.h"
+
+#include "tests/fixtures/BiLevelWriter.h"
+#include "tests/fixtures/JpegBlockWriter.h"
+#include "tests/fixtures/NitfImageWriter.h"
+#include "tests/fixtures/RpfFrameWriter.h"
+
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+#define VX_SANITIZED_HEAP 1
+#elif defined(__has_feature)
+#if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
+#define VX_SANITIZED_HEAP 1
+#endif
+#endif
+#ifdef VX_SANITIZED_HEAP
+extern "C" size_t __sanitizer_get_current_allocated_bytes(); // gcc ships no header for it
+#else
+#include <malloc.h>
+#endif
+
+namespace {
+
+constexpr int32_t kRows = 70, kColumns = 90, kBlockSide = 32; // edge blocks padded
+constexpr uint32_t kFaxWidth = 96, kFaxHeight = 48;
+
+std::string AsString(const Bytes& bytes)
+{
+    return std::string(bytes.begin(), bytes.end());
+}
+
+NitfImagePlan Image(const std::string& IREP, size_t bands, char IMODE, char ICORDS = ' ', const char* IGEOLO = "")
+{
+    NitfImagePlan plan;
+    plan.rows = kRows;
+    plan.columns = kColumns;
+    plan.IREP = IREP;
+    plan.IMODE = IMODE;
+    plan.ICORDS = ICORDS;
+    plan.IGEOLO = IGEOLO;
+    plan.bands.assign(bands, NitfBandPlan{});
+    for (size_t band = 0; bands == 3 && band < 3; ++band)
+        plan.bands[band].IREPBAND = std::string(1, "RGB"[band]);
+    plan.NBPR = (kColumns + kBlockSide - 1) / kBlockSide;
+    plan.NBPC = (kRows + kBlockSide - 1) / kBlockSide;
+    plan.NPPBH = plan.NPPBV = kBlockSide;
+    return plan;
+}
+
+std::string Uncompressed(const NitfImagePlan& plan, unsigned seed)
+{
+    const uint64_t mask = (1u << (plan.ABPP ? plan.ABPP : plan.NBPP)) - 1;
+    const std::vector<std::string> blocks = BuildImageBlocks(plan, [&](int32_t band, int32_t row, int32_t column) {
+        return (uint64_t(band * 70 + row * 3 + column * 5) + seed * 11) * (mask > 0xFF ? 29 : 1) & mask;
+    });
+    std::vector<bool> stored(blocks.size());
+    for (size_t i = 0; i < stored.size(); ++i)
+        stored[i] = i % 4 != 1;
+    return BuildImageFile(plan, plan.IC == "NM" ? BuildMaskedData(blocks, stored, 8) : JoinBlocks(blocks),
+                          plan.downgradeEvent);
+}
+
+std::string Frame(RpfProduct product, bool bigEndian, std::set<uint32_t> masked)
+{
+    RpfFramePlan plan;
+    plan.product = product;
+    plan.bigEndian = bigEndian;
+    plan.indexImage = PatternIndexImage();
+    plan.maskedSubframes = std::move(masked);
+    return BuildRpfFrame(plan).bytes;
+}
+
+// A grey image of 2 x 2 blocks of 16 x 16, or one 24 x 16 colour block.
+std::string Jpeg(int components, unsigned seed)
+{
+    const bool grey = components == 1;
+    NitfImagePlan plan = Image(grey ? "MONO" : "YCbCr601", size_t(components), grey ? 'B' : 'P');
+    plan.IC = "C3";
+    plan.COMRAT = "00.0";
+    plan.NBPR = plan.NBPC = grey ? 2 : 1;
+    plan.NPPBH = grey ? 16 : 24;
+    plan.NPPBV = 16;
+    plan.columns = plan.NPPBH * plan.NBPR;
+    plan.rows = plan.NPPBV * plan.NBPC;
+    JpegBlockPlan block;
+    block.width = uint32_t(plan.NPPBH);
+    block.components = components;
+    std::vector<Bytes> streams;
+    for (unsigned i = 0; i < unsigned(plan.NBPR * plan.NBPC); ++i)
+        streams.push_back(EncodeJpegBlock(TestPattern(block.width, 16, components, seed * 4 + i), block));
+    const NitfApp6Plan app6{uint16_t(plan.NBPR), uint16_t(plan.NBPC), 0, uint8_t(grey ? 0 : 2)};
+    return BuildImageFile(plan, AsString(BuildNitfJpegData(streams, app6)));
+}
+
+std::string BiLevel(bool twoDimensional, unsigned seed)
+{
+    std::vector<uint8_t> packed(size_t(kFaxWidth / 8) * kFaxHeight);
+    for (size_t i = 0; i < packed.size(); ++i)
+        packed[i] = uint8_t((i * 37 + seed * 11) ^ (i / 12));
+    NitfImagePlan plan;
+    plan.columns = int32_t(kFaxWidth);
+    plan.rows = int32_t(kFaxHeight);
+    plan.NBPP = 1;
+    plan.IC = "C1";
+    plan.COMRAT = twoDimensional ? "2DS " : "1D  ";
+    return BuildImageFile(plan, AsString(EncodeT4Strip(packed, kFaxWidth, kFaxHeight, twoDimensional)));
+}
+
+void Mix(uint64_t& digest, const uint8_t* bytes, size_t count)
+{
+    for (size_t i = 0; i < count; ++i)
+        digest = (digest ^ bytes[i]) * 1099511628211ull;
+}
+
+} // namespace
+
+std::vector<SampleFile> FilesOfEveryKind(unsigned seed)
+{
+    NitfImagePlan lut = Image("RGB/LUT", 1, 'B');
+    lut.bands[0] = NitfBandPlan{"LU", 3, 200, RgbLookupTables(200)};
+    NitfImagePlan mono16 = Image("MONO", 1, 'B');
+    mono16.NBPP = 16;
+    mono16.ABPP = 12;
+    NitfImagePlan nitf20 = Image("RGB", 3, 'S', 'U', "18SUJ234830647918SUJ244830647918SUJ244830547918SUJ2348305479");
+    nitf20.version21 = false;
+    nitf20.downgradeEvent = true;
+    nitf20.comments = {"first comment", "second comment"};
+    nitf20.UDID = Tre("TESTXX", "user defined");
+    NitfImagePlan masked = Image("MONO", 1, 'B', 'N', "335000004000000335060004000000335060003992000335000003992000");
+    masked.IC = "NM";
+    return {
+        {"compressed_jpeg_grey", Jpeg(1, seed)},
+        {"compressed_jpeg_colour", Jpeg(3, seed)},
+        {"compressed_bilevel_1d", BiLevel(false, seed)},
+        {"compressed_bilevel_2d", BiLevel(true, seed)},
+        {"cadrg_big_endian", Frame(RpfProduct::Cadrg, true, {seed % kRpfSubframeCount, 35})},
+        {"cadrg_little_endian", Frame(RpfProduct::Cadrg, false, {seed % kRpfSubframeCount, 35})},
+        {"cib", Frame(RpfProduct::Cib, true, {7})},
+        {"mono_geographic", Uncompressed(Image("MONO", 1, 'B', 'G', "324530N0784510W324530N0784400W324415N0784400W324415N0784510W"), seed)},
+        {"rgb_pixel_decimal", Uncompressed(Image("RGB", 3, 'P', 'D', "+32.758-078.753+32.758-078.733+32.737-078.733+32.737-078.753"), seed)},
+        {"rgb_row_utm", Uncompressed(Image("RGB", 3, 'R', 'N', "335000004000000335060004000000335060003992000335000003992000"), seed)},
+        {"rgb_band_sequential_mgrs_20", Uncompressed(nitf20, seed)},
+        {"lookup_table", Uncompressed(lut, seed)},
+        {"mono16", Uncompressed(mono16, seed)},
+        {"masked_blocks_utm", Uncompressed(masked, seed)},
+    };
+}
+
+std::vector<SampleFile> RefusedFiles()
+{
+    RpfFramePlan shortTable;
+    shortTable.indexImage = std::vector<uint8_t>(kRpfFrameSide * kRpfFrameSide, 3);
+    shortTable.colorTableRecords = {32};
+    NitfFilePlan noSections; // RPFHDR present, the RPF sections missing
+    noSections.images.push_back({std::string(100, 'x'), std::string(100, 'y')});
+    noSections.userHeaderData = Tre("RPFHDR", std::string(48, '\0'));
+    NitfImagePlan plan;
+    plan.rows = plan.columns = 8;
+    plan.COMRAT = "00.0";
+    plan.IC = "C2"; // parses, never served
+    const std::string dpcm = BuildImageFile(plan, std::string(64, '\0'));
+    plan.IC = "C8"; // not even parsed
+    const std::string jpeg2000 = BuildImageFile(plan, std::string(64, '\0'));
+    plan.IC = "NC";
+    const std::string cut = BuildImageFile(plan, std::string(64, '\0')).substr(0, 300);
+    plan.PVTYPE = "R";
+    plan.NBPP = 32;
+    return {{"rpf_short_colour_table", BuildRpfFrame(shortTable).bytes},
+            {"rpf_sections_missing", BuildNitfFile(noSections)},
+            {"dpcm", dpcm},
+            {"jpeg2000", jpeg2000},
+            {"real_pixels", BuildImageFile(plan, std::string(256, '\0'))},
+            {"cut_header", cut}};
+}
+
+bool DrawResult::operator==(const DrawResult& o) const
+{
+    return openResult == o.openResult && status == o.status && width == o.width && height == o.height &&
+           pixelKind == o.pixelKind && failedRows == o.failedRows && digest == o.digest;
+}
+
+DrawResult OpenDrawClose(const HandlerExports& rh, const std::string& path, uint32_t maxRows)
+{
+    DrawResult result;
+    OpenedImage image(rh, path);
+    result.openResult = image.result;
+    result.status = image.handle.status;
+    if (!image.Ready())
+        return result;
+    result.width = image.handle.width;
+    result.height = image.handle.height;
+    result.pixelKind = image.handle.pixelKind;
+    result.digest = 1469598103934665603ull;
+    if (image.handle.palette != nullptr)
+        Mix(result.digest, image.handle.palette->entries, size_t(image.handle.palette->entryCount) * 3);
+    std::vector<uint8_t> pixels;
+    if (!image.Draw(0, 0, int32_t(result.width), int32_t(std::min(result.height, maxRows)), pixels, result.failedRows))
+        result.failedRows = UINT32_MAX;
+    Mix(result.digest, pixels.data(), pixels.size());
+    return result;
+}
+
+size_t HeapInUse()
+{
+#ifdef VX_SANITIZED_HEAP
+    return __sanitizer_get_current_allocated_bytes();
+#else
+    return mallinfo2().uordblks;
+#endif
+}
