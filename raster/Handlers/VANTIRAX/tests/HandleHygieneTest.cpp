@@ -26,16 +26,16 @@ size_t OpenDescriptors()
 
 struct Samples {
     TempDirectory directory;
-    std::vector<std::string> good, refused;
+    std::vector<std::string> good, hostile;
     std::string vanishing = directory / "vanishing.ntf", vanishingBytes;
 
     Samples()
     {
         for (const SampleFile& file : FilesOfEveryKind())
             WriteFile(good.emplace_back(directory / (file.name + ".ntf")), vanishingBytes = file.bytes);
-        for (const SampleFile& file : RefusedFiles())
-            WriteFile(refused.emplace_back(directory / (file.name + ".ntf")), file.bytes);
-        refused.push_back(directory / "missing.ntf");
+        for (const SampleFile& file : HostileFiles())
+            WriteFile(hostile.emplace_back(directory / (file.name + ".ntf")), file.bytes);
+        hostile.push_back(directory / "missing.ntf");
     }
 };
 
@@ -51,9 +51,11 @@ void OneHandle(const HandlerExports& rh, const Samples& samples, unsigned i)
         break;
     }
     case 1: {
-        const std::string& refused = samples.refused[i / 4 % samples.refused.size()];
-        rh.isFormat(refused.c_str());
-        ASSERT_FALSE(OpenedImage(rh, refused).Ready()) << refused;
+        const std::string& hostile = samples.hostile[i / 4 % samples.hostile.size()];
+        rh.isFormat(hostile.c_str());
+        const DrawResult result = OpenDrawClose(rh, hostile, kRowsPerDraw);
+        ASSERT_TRUE(result.openResult != 1 || result.status != kStatusOk || result.failedRows == kRowsPerDraw)
+            << hostile;
         break;
     }
     case 2: { // a reversed span detaches the handler from the handle; the export releases it

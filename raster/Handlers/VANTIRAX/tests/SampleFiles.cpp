@@ -5,6 +5,9 @@
 #include "tests/fixtures/NitfImageWriter.h"
 #include "tests/fixtures/RpfFrameWriter.h"
 
+#include <map>
+#include <tuple>
+
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
 #define VX_SANITIZED_HEAP 1
 #elif defined(__has_feature)
@@ -69,8 +72,9 @@ std::string Frame(RpfProduct product, bool bigEndian, std::set<uint32_t> masked)
     return BuildRpfFrame(plan).bytes;
 }
 
-// A grey image of 2 x 2 blocks of 16 x 16, or one 24 x 16 colour block.
-std::string Jpeg(int components, unsigned seed)
+// A grey image of 2 x 2 blocks of 16 x 16, or one 24 x 16 colour block;
+// streamScale > 1 makes each stream that many times larger than its block.
+std::string Jpeg(int components, unsigned seed, uint32_t streamScale = 1)
 {
     const bool grey = components == 1;
     NitfImagePlan plan = Image(grey ? "MONO" : "YCbCr601", size_t(components), grey ? 'B' : 'P');
@@ -82,11 +86,14 @@ std::string Jpeg(int components, unsigned seed)
     plan.columns = plan.NPPBH * plan.NBPR;
     plan.rows = plan.NPPBV * plan.NBPC;
     JpegBlockPlan block;
-    block.width = uint32_t(plan.NPPBH);
+    block.width = uint32_t(plan.NPPBH) * streamScale;
+    block.height = uint32_t(plan.NPPBV) * streamScale;
     block.components = components;
     std::vector<Bytes> streams;
     for (unsigned i = 0; i < unsigned(plan.NBPR * plan.NBPC); ++i)
-        streams.push_back(EncodeJpegBlock(TestPattern(block.width, 16, components, seed * 4 + i), block));
+        streams.push_back(EncodeJpegBlock(streamScale > 1 ? Bytes(size_t(block.width) * block.height, 0x80)
+                                                          : TestPattern(block.width, block.height, components, seed * 4 + i),
+                                          block));
     const NitfApp6Plan app6{uint16_t(plan.NBPR), uint16_t(plan.NBPC), 0, uint8_t(grey ? 0 : 2)};
     return BuildImageFile(plan, AsString(BuildNitfJpegData(streams, app6)));
 }
@@ -136,7 +143,8 @@ std::vector<SampleFile> FilesOfEveryKind(unsigned seed)
         {"cadrg_little_endian", Frame(RpfProduct::Cadrg, false, {seed % kRpfSubframeCount, 35})},
         {"cib", Frame(RpfProduct::Cib, true, {7})},
         {"mono_geographic", Uncompressed(Image("MONO", 1, 'B', 'G', "324530N0784510W324530N0784400W324415N0784400W324415N0784510W"), seed)},
-        {"rgb_pixel_decimal", Uncompressed(Image("RGB", 3, 'P', 'D', "+32.758-078.753+32.758-078.733+32.737-078.733+32.737-078.753"), seed)},
+        {"rgb_pixel_decimal", // rotated: not north up
+          Uncompressed(Image("RGB", 3, 'P', 'D', "+45.000+010.000+45.100+010.200+45.050+010.250+44.950+010.050"), seed)},
         {"rgb_row_utm", Uncompressed(Image("RGB", 3, 'R', 'N', "335000004000000335060004000000335060003992000335000003992000"), seed)},
         {"rgb_band_sequential_mgrs_20", Uncompressed(nitf20, seed)},
         {"lookup_table", Uncompressed(lut, seed)},
@@ -145,7 +153,7 @@ std::vector<SampleFile> FilesOfEveryKind(unsigned seed)
     };
 }
 
-std::vector<SampleFile> RefusedFiles()
+std::vector<SampleFile> HostileFiles()
 {
     RpfFramePlan shortTable;
     shortTable.indexImage = std::vector<uint8_t>(kRpfFrameSide * kRpfFrameSide, 3);
@@ -169,13 +177,24 @@ std::vector<SampleFile> RefusedFiles()
             {"dpcm", dpcm},
             {"jpeg2000", jpeg2000},
             {"real_pixels", BuildImageFile(plan, std::string(256, '\0'))},
-            {"cut_header", cut}};
+            {"cut_header", cut},
+            {"jpeg_streams_larger_than_blocks", Jpeg(1, 0, 16)}};
+}
+
+const std::string& SampleBytes(const std::string& name)
+{
+    static std::map<std::string, std::string> files;
+    if (files.empty())
+        for (const auto& list : {FilesOfEveryKind(), HostileFiles()})
+            for (const SampleFile& file : list)
+                files[file.name] = file.bytes;
+    return files.at(name);
 }
 
 bool DrawResult::operator==(const DrawResult& o) const
 {
-    return openResult == o.openResult && status == o.status && width == o.width && height == o.height &&
-           pixelKind == o.pixelKind && failedRows == o.failedRows && digest == o.digest;
+    return std::tie(openResult, status, width, height, pixelKind, failedRows, digest) ==
+           std::tie(o.openResult, o.status, o.width, o.height, o.pixelKind, o.failedRows, o.digest);
 }
 
 DrawResult OpenDrawClose(const HandlerExports& rh, const std::string& path, uint32_t maxRows)

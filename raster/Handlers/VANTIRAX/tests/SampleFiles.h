@@ -18,8 +18,10 @@ struct SampleFile {
 // blocks, JPEG and bi-level images. Compressed kinds first: the first open of
 // such a file binds the imaging library. Files of other seeds differ in pixels.
 std::vector<SampleFile> FilesOfEveryKind(unsigned seed = 0);
-// Files that are recognised or parsed and then refused at open.
-std::vector<SampleFile> RefusedFiles();
+// Files that are refused at open, or (the last) open with rows that fail.
+std::vector<SampleFile> HostileFiles();
+// The bytes of the file of either list with this name.
+const std::string& SampleBytes(const std::string& name);
 
 // What one open, draw of full-width rows [0, maxRows) and close gives: the
 // handle's description and an FNV-1a digest of the palette and rows.
