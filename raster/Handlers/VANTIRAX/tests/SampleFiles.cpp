@@ -51,9 +51,9 @@ NitfImagePlan Image(const std::string& IREP, size_t bands, char IMODE, char ICOR
 
 std::string Uncompressed(const NitfImagePlan& plan, unsigned seed)
 {
-    const uint64_t mask = (1u << (plan.ABPP ? plan.ABPP : plan.NBPP)) - 1;
+    const uint64_t values = plan.bands[0].NELUT ? plan.bands[0].NELUT : 1u << (plan.ABPP ? plan.ABPP : plan.NBPP);
     const std::vector<std::string> blocks = BuildImageBlocks(plan, [&](int32_t band, int32_t row, int32_t column) {
-        return (uint64_t(band * 70 + row * 3 + column * 5) + seed * 11) * (mask > 0xFF ? 29 : 1) & mask;
+        return (uint64_t(band * 70 + row * 3 + column * 5) + seed * 11) * (values > 256 ? 29 : 1) % values;
     });
     std::vector<bool> stored(blocks.size());
     for (size_t i = 0; i < stored.size(); ++i)
