@@ -27,7 +27,7 @@ ProcessResult RunProgram(const std::vector<std::string>& argv)
     const int spawned = posix_spawnp(&child, args[0], &actions, nullptr, args.data(), environ);
     posix_spawn_file_actions_destroy(&actions);
     int status = 0;
-    struct rusage usage {};
+    struct rusage usage { };
     if (spawned != 0 || wait4(child, &status, 0, &usage) != child)
         return result;
     result.exitCode = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
@@ -49,8 +49,8 @@ HostInfo ReadHostInfo(const std::string& path)
     HostInfo info;
     const std::string json = RunHost({"info", path}).out;
     const std::string n = "([-+0-9.eE]+)";
-    const std::regex size("\"width\": (\\d+), \"height\": (\\d+)"), epsg("\"epsg\": (\\d+)"), point("\\[" + n + ", " + n + ", " + n + ", " + n + "\\]"),
-        entry("\\[(\\d+), (\\d+), (\\d+)\\]");
+    const std::regex size("\"width\": (\\d+), \"height\": (\\d+)"), epsg("\"epsg\": (\\d+)"),
+        point("\\[" + n + ", " + n + ", " + n + ", " + n + "\\]"), entry("\\[(\\d+), (\\d+), (\\d+)\\]");
     std::smatch m;
     if (std::regex_search(json, m, size)) {
         info.width = uint32_t(std::stoul(m[1]));

@@ -28,7 +28,7 @@ void PrintTo(const Rendering& r, std::ostream* out)
     *out << r.sample << (*r.window ? " window " : "") << r.window;
 }
 
-class HostRender : public testing::TestWithParam<Rendering> {};
+class HostRender : public testing::TestWithParam<Rendering> { };
 
 TEST_P(HostRender, GdalReadsWhatInfoAndDumpSay)
 {
@@ -56,7 +56,7 @@ TEST_P(HostRender, GdalReadsWhatInfoAndDumpSay)
         for (int axis = 2; info.epsg && axis < 4; ++axis) {
             const auto& p = info.points;
             const double host = p[0][axis] + (x0 + a) * (p[1][axis] - p[0][axis]) / info.width +
-                                (y0 + b) * (p[2][axis] - p[0][axis]) / info.height;
+                (y0 + b) * (p[2][axis] - p[0][axis]) / info.height;
             EXPECT_NEAR(axis == 2 ? gdal.X(a, b) : gdal.Y(a, b), host, 1e-4 * std::fabs(gdal.geoTransform[1]))
                 << "corner " << a << ", " << b;
         }
@@ -119,7 +119,8 @@ TEST(HostMosaic, FramesMeetOnOneGridWithNodataAround)
         const char* name;
         double west, north;
         uint32_t column, row;
-    } frames[] = {{"nw", -100.0, 40.0, 0, 0}, {"ne", -99.5, 40.0, kRpfFrameSide, 0}, {"sw", -100.0, 39.5, 0, kRpfFrameSide}};
+    } frames[] = {
+        {"nw", -100.0, 40.0, 0, 0}, {"ne", -99.5, 40.0, kRpfFrameSide, 0}, {"sw", -100.0, 39.5, 0, kRpfFrameSide}};
     for (const auto& f : frames) {
         const std::string path = in / (std::string(f.name) + ".ntf"), dump = out / (std::string(f.name) + ".raw");
         WriteFile(path, FrameFile(CornersAt(f.west, f.north), RpfProduct::Cadrg, {0, 35}));

@@ -21,16 +21,6 @@ std::vector<std::smatch> AllMatches(const std::string& text, const std::string& 
 
 } // namespace
 
-double GdalReport::X(double column, double row) const
-{
-    return geoTransform[0] + column * geoTransform[1] + row * geoTransform[2];
-}
-
-double GdalReport::Y(double column, double row) const
-{
-    return geoTransform[3] + column * geoTransform[4] + row * geoTransform[5];
-}
-
 GdalReport ReadWithGdal(const std::string& path)
 {
     GdalReport report;
@@ -46,8 +36,9 @@ GdalReport ReadWithGdal(const std::string& path)
         report.epsg = std::stoi(id[1]);
     if (std::regex_search(json, m, std::regex("UTM zone (\\d+)([NS])"))) // named without a code in NITF
         report.epsg = (m[2] == "N" ? 32600 : 32700) + std::stoi(m[1]);
-    const auto transform = AllMatches(json, "\"geoTransform\":\\s*\\[" + kNumber + "," + kNumber + "," + kNumber +
-                                                "," + kNumber + "," + kNumber + "," + kNumber + "\\]");
+    const auto transform = AllMatches(json,
+                                      "\"geoTransform\":\\s*\\[" + kNumber + "," + kNumber + "," + kNumber + "," +
+                                          kNumber + "," + kNumber + "," + kNumber + "\\]");
     for (size_t i = 0; !transform.empty() && i < 6; ++i)
         report.geoTransform[i] = std::stod(transform[0][i + 1]);
     for (const std::smatch& sum : AllMatches(json, "\"checksum\":\\s*(\\d+)"))
@@ -57,7 +48,8 @@ GdalReport ReadWithGdal(const std::string& path)
     if ((report.hasNodata = std::regex_search(json, m, std::regex("\"noDataValue\":" + kNumber))))
         report.nodata = std::stod(m[1]);
     const size_t entries = json.find("\"entries\"");
-    const std::string table = entries == std::string::npos ? "" : json.substr(entries, json.find('}', entries) - entries);
+    const std::string table =
+        entries == std::string::npos ? "" : json.substr(entries, json.find('}', entries) - entries);
     for (const std::smatch& e : AllMatches(table, "\\[\\s*(\\d+),\\s*(\\d+),\\s*(\\d+),\\s*\\d+\\s*\\]"))
         report.colourTable.push_back({std::stoi(e[1]), std::stoi(e[2]), std::stoi(e[3])});
     return report;

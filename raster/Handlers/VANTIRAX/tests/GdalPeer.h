@@ -11,7 +11,7 @@
 struct GdalReport {
     bool read = false;
     uint32_t width = 0, height = 0;
-    int epsg = 0;                    // of the coordinate system's outermost ID
+    int epsg = 0; // of the coordinate system's outermost ID
     std::array<double, 6> geoTransform{};
     std::vector<uint32_t> checksums; // one per band
     std::vector<std::string> colourInterpretations;
@@ -20,8 +20,8 @@ struct GdalReport {
     std::vector<std::array<int, 3>> colourTable;
 
     // World position of the pixel-corner grid point (column, row).
-    double X(double column, double row) const;
-    double Y(double column, double row) const;
+    double X(double c, double r) const { return geoTransform[0] + c * geoTransform[1] + r * geoTransform[2]; }
+    double Y(double c, double r) const { return geoTransform[3] + c * geoTransform[4] + r * geoTransform[5]; }
 };
 
 GdalReport ReadWithGdal(const std::string& path);

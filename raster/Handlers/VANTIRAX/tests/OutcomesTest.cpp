@@ -25,7 +25,7 @@ struct Outcome {
     // values, "=NAME" for a file that must draw exactly as file NAME does,
     // or null for a file whose every row fails.
     const char* peer = "";
-    unsigned shift = 0;       // GDAL's samples have 16 bits: the host shows the top 8 of ABPP
+    unsigned shift = 0; // GDAL's samples have 16 bits: the host shows the top 8 of ABPP
     // GDAL reads IGEOLO corners as pixel centres, RPF frame corners as the
     // outer edges; the record's control points name pixels 0 and w - 1 either way.
     bool edgeCorners = false;
@@ -56,11 +56,6 @@ const Outcome kOutcomes[] = {
     {"jpeg_streams_larger_than_blocks", 1, 1, kStatusOk, kPixelGreyPaletted, 256, nullptr},
 };
 
-const HandlerExports& Handler()
-{
-    return LoadHandler(VX_HANDLER_PATH);
-}
-
 const std::string& PathOf(const std::string& name)
 {
     static TempDirectory directory;
@@ -82,32 +77,28 @@ std::vector<uint8_t> GdalPixels(const std::string& samples, size_t pixelCount, s
     return pixels;
 }
 
-size_t FirstDifference(const std::vector<uint8_t>& a, const std::vector<uint8_t>& b)
-{
-    return size_t(std::mismatch(a.begin(), a.end(), b.begin(), b.end()).first - a.begin());
-}
-
 void PrintTo(const Outcome& outcome, std::ostream* out)
 {
     *out << outcome.name;
 }
 
-class Outcomes : public testing::TestWithParam<Outcome> {};
+class Outcomes : public testing::TestWithParam<Outcome> { };
 
 TEST_P(Outcomes, AsTheHostSeesThemAndGdalDecodes)
 {
     const Outcome& expected = GetParam();
+    const HandlerExports& rh = LoadHandler(VX_HANDLER_PATH);
     const std::string& path = PathOf(expected.name);
-    EXPECT_EQ(Handler().isFormat(path.c_str()), expected.probe);
+    EXPECT_EQ(rh.isFormat(path.c_str()), expected.probe);
     RHHandle handle{};
     handle.status = kHostStatus;
-    EXPECT_EQ(Handler().open(&handle, path.c_str()), expected.result);
+    EXPECT_EQ(rh.open(&handle, path.c_str()), expected.result);
     EXPECT_EQ(handle.status, expected.status);
     EXPECT_EQ(handle.handler != nullptr, expected.status != kHostStatus) << "handler attached";
-    EXPECT_EQ(Handler().close(&handle), 1);
+    EXPECT_EQ(rh.close(&handle), 1);
     if (expected.status != kStatusOk)
         return;
-    OpenedImage image(Handler(), path);
+    OpenedImage image(rh, path);
     ASSERT_TRUE(image.Ready());
     EXPECT_EQ(image.handle.pixelKind, expected.pixelKind);
     EXPECT_EQ(image.handle.palette ? image.handle.palette->entryCount : 0, int32_t(expected.paletteEntries));
@@ -118,8 +109,8 @@ TEST_P(Outcomes, AsTheHostSeesThemAndGdalDecodes)
     if (expected.peer == nullptr)
         return;
     if (expected.peer[0] == '=') {
-        EXPECT_TRUE(OpenDrawClose(Handler(), path, UINT32_MAX) ==
-                    OpenDrawClose(Handler(), PathOf(expected.peer + 1), UINT32_MAX));
+        EXPECT_TRUE(OpenDrawClose(rh, path, UINT32_MAX) ==
+                    OpenDrawClose(rh, PathOf(expected.peer + 1), UINT32_MAX));
         return;
     }
     const GdalReport gdal = ReadWithGdal(path);
@@ -127,8 +118,10 @@ TEST_P(Outcomes, AsTheHostSeesThemAndGdalDecodes)
     ASSERT_EQ(gdal.width, image.handle.width);
     ASSERT_EQ(gdal.height, image.handle.height);
     const size_t bands = image.BytesPerPixel(), pixelCount = pixels.size() / bands;
-    const std::vector<uint8_t> gdalPixels = GdalPixels(GdalSamples(path, expected.peer), pixelCount, bands, expected.shift);
-    const size_t at = FirstDifference(pixels, gdalPixels);
+    const std::vector<uint8_t> gdalPixels =
+        GdalPixels(GdalSamples(path, expected.peer), pixelCount, bands, expected.shift);
+    const size_t at = size_t(std::mismatch(pixels.begin(), pixels.end(), gdalPixels.begin(), gdalPixels.end()).first -
+                             pixels.begin());
     EXPECT_EQ(at, pixels.size()) << "pixel " << at / bands << " of " << pixelCount;
     // A grey palette maps each value to its grey; a colour palette is GDAL's
     // colour table but for the masked value 216 (white here, GDAL's no-data).

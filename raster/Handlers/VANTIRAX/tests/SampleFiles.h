@@ -1,7 +1,7 @@
 // Small files of every kind the handler serves, built by the fixture writers,
-// for the outcome table, the handle and thread tests, the Windows comparison
-// and the fuzz seeds; files it must refuse; and what one open, draw and close
-// of a file gives.
+// for the outcome table, the handle and thread tests, the host's tests, the
+// Windows comparison and the fuzz seeds; hostile files; and what one open,
+// draw and close of a file gives.
 #pragma once
 
 #include "tests/fixtures/HandlerLoader.h"
@@ -23,15 +23,12 @@ std::vector<SampleFile> HostileFiles();
 // The bytes of the file of either list with this name.
 const std::string& SampleBytes(const std::string& name);
 
-// What one open, draw of full-width rows [0, maxRows) and close gives: the
-// handle's description and an FNV-1a digest of the palette and rows.
-struct DrawResult {
-    int32_t openResult = 0;
-    uint32_t status = 0, width = 0, height = 0, pixelKind = 0, failedRows = 0;
-    uint64_t digest = 0;
-    bool operator==(const DrawResult& o) const;
-};
-DrawResult OpenDrawClose(const HandlerExports& rh, const std::string& path, uint32_t maxRows);
+// One open, draw of full-width rows [0, maxRows) and close, as a line
+// "result R status S failed F size W x H kind K" (failed 0 when not drawn),
+// then the palette's bytes and the rows'.
+std::string OpenDrawClose(const HandlerExports& rh, const std::string& path, uint32_t maxRows);
+// How it begins for a file that opens and draws every row.
+constexpr char kDrawnClean[] = "result 1 status 0 failed 0 ";
 
 // Bytes of heap the process holds: the sanitizer's count in sanitized builds,
 // the C library's otherwise.
