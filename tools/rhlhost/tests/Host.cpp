@@ -5,9 +5,9 @@
 
 #include <fcntl.h>
 #include <filesystem>
+#include <fstream>
 #include <regex>
 #include <spawn.h>
-#include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -26,12 +26,19 @@ ProcessResult RunProgram(const std::vector<std::string>& argv)
     pid_t child = 0;
     const int spawned = posix_spawnp(&child, args[0], &actions, nullptr, args.data(), environ);
     posix_spawn_file_actions_destroy(&actions);
+    // The child's own peak is the VmHWM of its image, read while it runs: the
+    // kernel's account of a spawned child counts the spawning process's peak too.
     int status = 0;
-    struct rusage usage { };
-    if (spawned != 0 || wait4(child, &status, 0, &usage) != child)
+    while (spawned == 0 && waitpid(child, &status, WNOHANG) == 0) {
+        std::ifstream proc("/proc/" + std::to_string(child) + "/status");
+        for (std::string line; std::getline(proc, line);)
+            if (line.rfind("VmHWM:", 0) == 0)
+                result.peakKilobytes = std::max(result.peakKilobytes, std::stol(line.substr(6)));
+        usleep(1000);
+    }
+    if (spawned != 0)
         return result;
     result.exitCode = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
-    result.peakKilobytes = usage.ru_maxrss;
     result.out = ReadWholeFile(out.path());
     result.err = ReadWholeFile(err.path());
     return result;

@@ -12,7 +12,7 @@
 struct ProcessResult {
     int exitCode = -1;
     std::string out, err;
-    long peakKilobytes = 0; // the child's peak resident set
+    long peakKilobytes = 0; // the child's peak resident set (VmHWM)
 };
 
 ProcessResult RunProgram(const std::vector<std::string>& argv);

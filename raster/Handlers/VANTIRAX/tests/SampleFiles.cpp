@@ -16,6 +16,7 @@ extern "C" size_t __sanitizer_get_current_allocated_bytes(); // gcc ships no hea
 namespace {
 
 constexpr uint32_t kFaxWidth = 96, kFaxHeight = 48;
+const char kUtmCorners[] = "335000004000000335060004000000335060003992000335000003992000"; // zone 33 north
 
 std::string AsString(const Bytes& bytes)
 {
@@ -112,7 +113,7 @@ std::vector<SampleFile> FilesOfEveryKind(unsigned seed)
     nitf20.downgradeEvent = true;
     nitf20.comments = {"first comment", "second comment"};
     nitf20.UDID = Tre("TESTXX", "user defined");
-    NitfImagePlan masked = Image("MONO", 1, 'B', 'N', "335000004000000335060004000000335060003992000335000003992000");
+    NitfImagePlan masked = Image("MONO", 1, 'B', 'N', kUtmCorners);
     masked.IC = "NM";
     return {
         {"compressed_jpeg_grey", Jpeg(1, seed)},
@@ -127,8 +128,7 @@ std::vector<SampleFile> FilesOfEveryKind(unsigned seed)
                       seed)},
         {"rgb_pixel_decimal", // rotated: not north up
          Uncompressed(Image("RGB", 3, 'P', 'D', "+45.000+010.000+45.100+010.200+45.050+010.250+44.950+010.050"), seed)},
-        {"rgb_row_utm",
-         Uncompressed(Image("RGB", 3, 'R', 'N', "335000004000000335060004000000335060003992000335000003992000"), seed)},
+        {"rgb_row_utm", Uncompressed(Image("RGB", 3, 'R', 'N', kUtmCorners), seed)},
         {"rgb_band_sequential_mgrs_20", Uncompressed(nitf20, seed)},
         {"lookup_table", Uncompressed(lut, seed)},
         {"mono16", Uncompressed(mono16, seed)},
