@@ -89,11 +89,9 @@ void CutFile(const fs::path& file)
     const uint32_t blocks = uint32_t(image.NBPR > 1) | uint32_t(image.NBPC > 1) << 1;
     if (image.compressionKind == kJpeg || image.compressionKind == kLosslessJpeg ||
         image.compressionKind == kDownsampledJpeg)
-        Write(
-            "jpeg", name,
-            Prefix(
-                {{image.NBANDS == 3, 1}, {blocks, 1}, {side(image.NPPBH), 2}, {side(image.NPPBV), 2}, {1, 1}, {0, 1}}) +
-                data);
+        Write("jpeg", name,
+              Prefix({{image.NBANDS == 3, 1}, {blocks, 1}, {side(image.NPPBH), 2}, {side(image.NPPBV), 2}, {1, 1},
+                      {0, 1}}) + data);
     else if (image.compressionKind == kBiLevel)
         Write("bilevel", name,
               Prefix({{side(image.NCOLS), 2}, {side(image.NROWS), 2}, {image.COMRAT[0] == '1', 1}}) + data);
