@@ -39,7 +39,14 @@ void CheckAllocation(size_t size)
 
 } // namespace
 
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__) // gcc
+#define VX_SANITIZER_OWNS_MALLOC 1
+#elif defined(__has_feature) // clang
+#if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
+#define VX_SANITIZER_OWNS_MALLOC 1
+#endif
+#endif
+#ifdef VX_SANITIZER_OWNS_MALLOC
 // The sanitizer owns malloc; its hooks see every allocation, as libFuzzer's do.
 extern "C" int __sanitizer_install_malloc_and_free_hooks(void (*)(const volatile void*, size_t),
                                                          void (*)(const volatile void*));

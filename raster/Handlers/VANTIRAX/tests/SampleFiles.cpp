@@ -7,7 +7,14 @@
 
 #include <map>
 
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__) // gcc
+#define VX_SANITIZER_OWNS_MALLOC 1
+#elif defined(__has_feature) // clang
+#if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
+#define VX_SANITIZER_OWNS_MALLOC 1
+#endif
+#endif
+#ifdef VX_SANITIZER_OWNS_MALLOC
 extern "C" size_t __sanitizer_get_current_allocated_bytes(); // gcc ships no header for it
 #else
 #include <malloc.h>
@@ -192,7 +199,7 @@ std::string OpenDrawClose(const HandlerExports& rh, const std::string& path, uin
 
 size_t HeapInUse()
 {
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+#ifdef VX_SANITIZER_OWNS_MALLOC
     return __sanitizer_get_current_allocated_bytes();
 #else
     return mallinfo2().uordblks;
