@@ -1,8 +1,8 @@
 #include "imaging/LeadToolLibWrapper.h"
 
+#include "base/ByteOrder.h"
 #include "imaging/JpegMarkers.h"
 #include "imaging/NitfJpegDefaults.h"
-#include "base/ByteOrder.h"
 
 #include <algorithm>
 #include <cstring>
@@ -17,14 +17,9 @@ const char* const kOutOfMemoryText = "CLeadToolLibWrapper::openJPEGBitmap. Not e
 
 namespace {
 
-constexpr uint8_t kApp6 = 0xE6;
 constexpr uint32_t kScanChunkSize = 32 * 1024; // one read per chunk: a stream costs few system calls
 constexpr uint32_t kLargestReaderOffset = 0x7FFFFFFF;   // CFileReader seeks take 32-bit signed offsets
 
-// The smallest JPEG stream a block can be: SOI, a one-component frame
-// header, a one-component scan header and EOI. A block count that the data
-// cannot hold at this size is refused before anything is allocated.
-constexpr uint32_t kSmallestJpegStream = 2 + 13 + 10 + 2;
 // NITF blocks are at most 8192 pixels a side, unless the image is one block.
 constexpr uint32_t kLargestNitfBlockSide = 8192;
 // The pixels one image may hold decoded in memory.
@@ -156,14 +151,6 @@ void ToHostOrder16(uint8_t* field)
     std::memcpy(field, &value, sizeof value);
 }
 
-void PutBigEndian32(uint8_t* field, uint32_t value)
-{
-    field[0] = static_cast<uint8_t>(value >> 24);
-    field[1] = static_cast<uint8_t>(value >> 16);
-    field[2] = static_cast<uint8_t>(value >> 8);
-    field[3] = static_cast<uint8_t>(value);
-}
-
 uint8_t ClampedByte(double value)
 {
     return static_cast<uint8_t>((value > 255.0 ? 255.0 : value) + 0.5);
@@ -218,7 +205,7 @@ void RepeatPixels(uint8_t* row, uint32_t first, uint32_t count, uint32_t factor,
 
 CLeadToolLibWrapper::CLeadToolLibWrapper()
 {
-    std::memcpy(tiffHeader, kBiLevelTiffTemplate.data(), kTiffHeaderSize);
+    std::memcpy(tiffHeader, kBiLevelTiffTemplate.data(), kBiLevelHeaderSize);
 }
 
 CLeadToolLibWrapper::~CLeadToolLibWrapper()
@@ -279,7 +266,7 @@ bool CLeadToolLibWrapper::ReadNitfApp6(CFileReader& reader, uint32_t dataOffset)
     JpegMarkerWalk walk(bytes);
     JpegSegment segment;
     const bool found =
-        walk.Next(segment) && walk.Next(segment) && segment.code == kApp6 && segment.length + 4 >= kApp6Size;
+        walk.Next(segment) && walk.Next(segment) && segment.code == kApplication6 && segment.length + 4 >= kApp6Size;
     if (!found || !SeekAndRead(reader, uint64_t(dataOffset) + segment.marker, app6, kApp6Size)) {
         ClearReadFailure(reader);
         return false;
@@ -310,8 +297,11 @@ bool CLeadToolLibWrapper::openJPEGBitmap(CFileReader& reader, uint32_t dataOffse
     library.L_GetDefaultLoadFileOption(&options, sizeof options);
     if (bitmaps != nullptr)
         throw std::runtime_error(kReinitialisedText);
+    // A block count that the data cannot hold at the smallest decodable
+    // stream each is refused before anything is allocated.
     const uint64_t fileEnd = ReadableEnd(reader);
-    if (bitmapCount == 0 || dataOffset >= fileEnd || bitmapCount > (fileEnd - dataOffset) / kSmallestJpegStream ||
+    if (bitmapCount == 0 || dataOffset >= fileEnd ||
+        bitmapCount > (fileEnd - dataOffset) / kSmallestDecodableJpegBytes ||
         (!streamOffsets.empty() && streamOffsets.size() != bitmapCount))
         return false;
     const uint64_t dataEnd = dataLength == 0 ? fileEnd : std::min(fileEnd, uint64_t(dataOffset) + dataLength);
@@ -424,11 +414,11 @@ bool CLeadToolLibWrapper::openBiLevelBitmap(CFileReader& reader, uint32_t dataOf
     bitmapCount = 1;
     // Every coded row takes at least one bit of the strip.
     uint64_t fileSize = reader.FileSize();
-    if (LI == 0 || dataOffset > fileSize || LI > fileSize - dataOffset || LI > UINT32_MAX - kTiffHeaderSize ||
+    if (LI == 0 || dataOffset > fileSize || LI > fileSize - dataOffset || LI > UINT32_MAX - kBiLevelHeaderSize ||
         NCOLS == 0 || NROWS == 0 || NROWS / 8 > LI)
         return false;
     AllocateBitmaps(library);
-    uint32_t total = LI + kTiffHeaderSize;
+    const uint32_t total = LI + kBiLevelHeaderSize;
     std::unique_ptr<uint8_t[]> file(new (std::nothrow) uint8_t[total]);
     if (!file)
         throw std::runtime_error(kOutOfMemoryText);
@@ -437,8 +427,8 @@ bool CLeadToolLibWrapper::openBiLevelBitmap(CFileReader& reader, uint32_t dataOf
     PutBigEndian32(tiffHeader + kTiffRowsPerStripValue, NROWS);
     PutBigEndian32(tiffHeader + kTiffStripByteCountsValue, LI);
     PutBigEndian32(tiffHeader + kTiffT4OptionsValue, oneDimensional ? kT4OneDimensional : kT4TwoDimensional);
-    std::memcpy(file.get(), tiffHeader, kTiffHeaderSize);
-    if (!SeekAndRead(reader, dataOffset, file.get() + kTiffHeaderSize, LI))
+    std::memcpy(file.get(), tiffHeader, kBiLevelHeaderSize);
+    if (!SeekAndRead(reader, dataOffset, file.get() + kBiLevelHeaderSize, LI))
         return false;
     LOADFILEOPTION options {};
     library.L_GetDefaultLoadFileOption(&options, sizeof options);

@@ -2,6 +2,8 @@
 // decoder for compressed images.
 #include "nitf/NitfImage.h"
 
+#include "imaging/JpegMarkers.h"
+
 #include <algorithm>
 #include <strings.h>
 
@@ -12,7 +14,6 @@ constexpr int32_t kGreyPaletteSize = 256;
 constexpr int32_t kLastPaletteIndex = 255;
 constexpr unsigned kRgbTables = 3;
 constexpr uint32_t kRgbPixelBytes = 3;
-constexpr unsigned kSmallestJpegStream = 4; // SOI and EOI markers
 
 // product *= factor, false when the product would pass limit.
 bool MultiplyWithin(uint64_t& product, uint64_t factor, uint64_t limit)
@@ -175,7 +176,7 @@ bool CNitfImage::PrepareJpegData(CFileReader& reader, uint32_t dataLength)
     if ((bits != 8 && bits != 24) || dataLength <= maskTableLength)
         return false;
     const uint64_t blocks = uint64_t(NBPR) * uint64_t(NBPC);
-    if (blocks > (readLimit - dataOffset) / kSmallestJpegStream)
+    if (blocks > (readLimit - dataOffset) / kMarkersOnlyJpegBytes)
         return false;
     storedBlockCount = static_cast<uint32_t>(blocks);
     FreeVector(decoder.streamOffsets);
