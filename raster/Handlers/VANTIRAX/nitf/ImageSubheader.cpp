@@ -1,6 +1,7 @@
 // ReadSubheader: the image subheader of the first image segment, in the NITF
 // 2.0 and 2.1 layouts, and the mask table that leads masked image data.
 #include "base/FieldNumbers.h"
+#include "nitf/NitfFileHeader.h"
 #include "nitf/NitfImage.h"
 #include "nitf/SubheaderCursor.h"
 #include "base/ByteOrder.h"
@@ -125,6 +126,15 @@ bool CNitfImage::ReadSubheader(CFileReader& reader, uint32_t offset)
     } catch (...) {
         return false;
     }
+}
+
+bool CNitfImage::ReadSubheader(CFileReader& reader, const CNitfFileHeader& header)
+{
+    if (header.NUMI < 1 || header.imageSegments == nullptr)
+        return false;
+    version21 = header.version21;
+    subheaderLength = header.imageSegments[0].subheaderLength;
+    return ReadSubheader(reader, header.HL);
 }
 
 bool CNitfImage::ReadFront(SubheaderCursor& cursor, uint32_t offset)

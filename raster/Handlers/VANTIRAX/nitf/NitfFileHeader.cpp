@@ -110,22 +110,16 @@ bool ReadHeaderData(CFileReader& reader, uint64_t fileSize, int32_t& length, int
 
 void CNitfFileHeader::SetPath(const char* filePath)
 {
-    delete[] path;
-    path = nullptr;
-    if (filePath == nullptr)
-        return;
-    size_t length = std::strlen(filePath);
-    path = new char[length + 1];
-    std::memcpy(path, filePath, length + 1);
+    path = filePath != nullptr ? filePath : "";
 }
 
 bool CNitfFileHeader::Parse()
 {
     try {
-        if (path == nullptr)
+        if (path.empty())
             return false;
         CFileReader reader(0);
-        reader.OpenFile(path, kShareDenyWrite);
+        reader.OpenFile(path.c_str(), kShareDenyWrite);
         if (!reader.HoldsFile())
             return false;
         uint64_t fileSize = reader.FileSize();
@@ -194,8 +188,7 @@ void CNitfFileHeader::Release()
     graphicSegments = nullptr;
     delete[] imageSegments;
     imageSegments = nullptr;
-    delete[] path;
-    path = nullptr;
+    path.clear();
 }
 
 bool CNitfFileHeader::HasRpfHeader() const

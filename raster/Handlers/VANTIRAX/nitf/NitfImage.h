@@ -13,6 +13,7 @@
 #include <memory>
 #include <vector>
 
+class CNitfFileHeader;
 class SubheaderCursor;
 
 template <typename T>
@@ -52,9 +53,8 @@ public:
     int32_t compressionKind = kUncompressed;
     uint8_t isMasked = 0;
     std::vector<uint32_t> blockOffsets; // per block (per band and block in IMODE S), relative to dataOffset
-    uint16_t fixedLayout = 0;       // copied from the file header before parsing
-    uint16_t version21 = 0;
-    uint32_t subheaderLength = 0;   // LISH of the segment, set by the caller; 0 when not known
+    uint16_t version21 = 0;         // 1 in NITF 2.1 (from the file header), set before parsing
+    uint32_t subheaderLength = 0;   // LISH of the segment, set before parsing; 0 when not known
     CLeadToolLibWrapper decoder;
     char subheaderText[kSubheaderFrontSize] = {};
     std::unique_ptr<char[]> IGEOLO; // 60 characters and a NUL, or null without corners
@@ -72,13 +72,16 @@ public:
     std::vector<uint8_t> IXSHD;
     int32_t NCOLS = 0, NROWS = 0;
 
-    explicit CNitfImage(uint16_t initialFixedLayout = 0) : fixedLayout(initialFixedLayout) {}
+    CNitfImage() = default;
     CNitfImage(const CNitfImage&) = delete;
     CNitfImage& operator=(const CNitfImage&) = delete;
 
     // Parses the image subheader at offset. Image data is taken to start at
     // offset + subheaderLength when that is known. False on any failure.
     bool ReadSubheader(CFileReader& reader, uint32_t offset);
+    // Parses the subheader of the file's first image segment: at HL, LISH
+    // bytes long, in the header's NITF version.
+    bool ReadSubheader(CFileReader& reader, const CNitfFileHeader& header);
     void Release();
 
     // Whether the image is served; sets up the decoder for compressed kinds.

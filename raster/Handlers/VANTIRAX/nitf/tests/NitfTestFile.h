@@ -22,10 +22,7 @@ struct LoadedImage {
         if (!header.Parse() || header.NUMI < 1)
             return false;
         reader.OpenFile(Path(), kShareDenyWrite);
-        image.fixedLayout = header.fixedLayout;
-        image.version21 = header.version21;
-        image.subheaderLength = header.imageSegments[0].subheaderLength;
-        return image.ReadSubheader(reader, header.HL);
+        return image.ReadSubheader(reader, header);
     }
     // Parse, PrepareData and AllocLineBuffer, as an open does.
     bool Open()
