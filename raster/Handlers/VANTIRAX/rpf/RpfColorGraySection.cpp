@@ -5,12 +5,10 @@
 namespace {
 
 constexpr uint16_t kColorOffsetRecordBytes = 17;
-constexpr uint32_t kPaletteRecords = 216;
 constexpr uint8_t kColorElementLength = 3;      // red, green, blue
 constexpr uint8_t kMonochromeElementLength = 4; // red, green, blue, monochrome
 constexpr uint8_t kGreyElementLength = 1;
 constexpr uint16_t kColorValueBits = 8;
-constexpr uint32_t kWhiteAbove = 216; // indices above this are white without a table
 
 } // namespace
 
@@ -120,7 +118,8 @@ bool RpfColorGraySection::ReadSelectedEntry(const RpfValueTable& table, uint32_t
 
 bool RpfColorGraySection::GetPaletteColor(uint32_t index, uint8_t& red, uint8_t& green, uint8_t& blue)
 {
-    if (index > kWhiteAbove) {
+    // Indices past the masked value are white without a table.
+    if (index > kMaskedPixel) {
         red = green = blue = 255;
         return true;
     }
@@ -135,7 +134,7 @@ bool RpfColorGraySection::GetPaletteColor(uint32_t index, uint8_t& red, uint8_t&
 
 bool RpfColorGraySection::GetPaletteGray(uint32_t index, uint8_t& grey)
 {
-    if (index > kWhiteAbove) {
+    if (index > kMaskedPixel) {
         grey = 255;
         return true;
     }

@@ -89,9 +89,9 @@ bool RpfCompressionSection::DecodeKernelRow(uint16_t kernelRow, uint16_t code, u
         return false;
     // A record narrower than the kernel leaves the remaining columns masked.
     uint16_t valuesWritten = table.valuesPerRecord < kernelWidth ? table.valuesPerRecord : kernelWidth;
-    std::memset(output + valuesWritten, MaskedPixel, kernelWidth - valuesWritten);
-    if (code == MaskedCode) {
-        std::memset(output, MaskedPixel, valuesWritten);
+    std::memset(output + valuesWritten, kMaskedPixel, kernelWidth - valuesWritten);
+    if (code == kMaskedCode) {
+        std::memset(output, kMaskedPixel, valuesWritten);
         return true;
     }
     return table.ReadTableEntry(code, output);

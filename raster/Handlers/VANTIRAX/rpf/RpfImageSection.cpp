@@ -1,6 +1,7 @@
 #include "rpf/RpfImageSection.h"
 
 #include "rpf/RpfFieldReader.h"
+#include "rpf/RpfValueTable.h"
 
 #include <algorithm>
 
@@ -9,7 +10,6 @@ namespace {
 constexpr uint32_t kNoMaskTable = 0xFFFFFFFF;
 constexpr uint64_t kMaskedSubframeStart = 0xFFFFFFFF;
 constexpr uint8_t kCodeBits = 12; // the only code length of CADRG and CIB frames
-constexpr uint16_t kMaskedCode = 0xFFFF;
 constexpr uint32_t kNoSubframe = 0xFFFFFFFF;
 constexpr uint64_t kMaxSubframeCacheBytes = 1 << 20; // a row of larger subframes is read a code row at a time
 

@@ -7,10 +7,12 @@
 #include <cstdint>
 #include <vector>
 
-// The code written for every position of a masked subframe, and the pixel
-// value (palette entry 216, white) that it decodes to.
-constexpr uint16_t MaskedCode = 0xFFFF;
-constexpr uint8_t MaskedPixel = 216;
+// Pixel values 0 to 215 index the frame's 216-record colour or grey table;
+// 216 is the masked value (white), which masked subframes and masked codes
+// decode to. kMaskedCode is the code written for every position of a masked subframe.
+constexpr uint8_t kMaskedPixel = 216;
+constexpr uint32_t kPaletteRecords = kMaskedPixel;
+constexpr uint16_t kMaskedCode = 0xFFFF;
 
 struct RpfValueTable {
     std::vector<uint8_t> data; // empty when the table is empty

@@ -87,7 +87,7 @@ TEST(RpfFrameReader, MaskedSubframesDecodeToTheMaskedPixel)
     // A span inside the masked subframe fills the whole code capacity with the masked code.
     ASSERT_TRUE(reader.ReadLine(opened->drawReader, 3, 260, 270, line.data()));
     EXPECT_EQ(std::vector<uint8_t>(line.begin(), line.begin() + 11), std::vector<uint8_t>(11, kRpfMaskedPixel));
-    EXPECT_EQ(reader.codeBuffer.back(), MaskedCode);
+    EXPECT_EQ(reader.codeBuffer.back(), kMaskedCode);
 }
 
 TEST(RpfFrameReader, ServesAnyColumnSpanAndRefusesSpansOutsideTheFrame)
