@@ -1,6 +1,7 @@
 #include "imaging/LeadToolLibWrapper.h"
 
 #include "base/ByteOrder.h"
+#include "base/Limits.h"
 #include "imaging/JpegMarkers.h"
 #include "imaging/NitfJpegDefaults.h"
 
@@ -18,14 +19,9 @@ const char* const kOutOfMemoryText = "CLeadToolLibWrapper::openJPEGBitmap. Not e
 namespace {
 
 constexpr uint32_t kScanChunkSize = 32 * 1024; // one read per chunk: a stream costs few system calls
-constexpr uint32_t kLargestReaderOffset = 0x7FFFFFFF;   // CFileReader seeks take 32-bit signed offsets
 
 // NITF blocks are at most 8192 pixels a side, unless the image is one block.
 constexpr uint32_t kLargestNitfBlockSide = 8192;
-// The pixels one image may hold decoded in memory.
-constexpr uint64_t kMaxImageBytes = uint64_t(1) << 30;
-// The largest factor by which an "I1" frame may have been downsampled.
-constexpr uint32_t kLargestDownsampling = 8;
 
 constexpr unsigned kGreyBits = 8;
 constexpr unsigned kColourBits = 24;
@@ -56,7 +52,7 @@ bool SeekAndRead(CFileReader& reader, uint64_t offset, void* buffer, uint32_t co
 // The end of what CFileReader can reach of the file.
 uint64_t ReadableEnd(const CFileReader& reader)
 {
-    return std::min<uint64_t>(reader.FileSize(), uint64_t(kLargestReaderOffset) + 1);
+    return std::min<uint64_t>(reader.FileSize(), kLargestReaderOffset + 1);
 }
 
 // A stretch of the file as the marker walk sees it, read a chunk at a time.
@@ -324,7 +320,7 @@ bool CLeadToolLibWrapper::openJPEGBitmap(CFileReader& reader, uint32_t dataOffse
         StreamPlace stream {};
         if (!LocateStream(reader, start, end, stream))
             throw std::runtime_error(kDamagedImageText);
-        options.maxBytes = kMaxImageBytes - imageBytes;
+        options.maxBytes = kMaxDecodedImageBytes - imageBytes;
         if (!LoadBlock(reader, library, block, static_cast<uint32_t>(stream.offset), stream.length, options))
             return false;
         imageBytes += BitmapBytes(bitmaps[block]);
@@ -434,7 +430,7 @@ bool CLeadToolLibWrapper::openBiLevelBitmap(CFileReader& reader, uint32_t dataOf
     library.L_GetDefaultLoadFileOption(&options, sizeof options);
     options.maxWidth = NCOLS;
     options.maxHeight = NROWS;
-    options.maxBytes = kMaxImageBytes;
+    options.maxBytes = kMaxDecodedImageBytes;
     FILEINFO info = FreshFileInfo();
     return library.L_LoadMemory(file.get(), bitmaps[0], sizeof(BITMAPHANDLE), kBitsAsStored, kOrderAsStored,
                                 kLoadFlagsBiLevel, nullptr, nullptr, total, &options, &info) == kLoadSucceeded;

@@ -244,7 +244,7 @@ bool CNitfImage::PlaceData(SubheaderCursor& cursor, uint32_t offset)
         return true;
     }
     const uint64_t declaredEnd = uint64_t(offset) + subheaderLength;
-    if (cursor.Position() > declaredEnd || declaredEnd > uint64_t(INT32_MAX))
+    if (cursor.Position() > declaredEnd || declaredEnd > kLargestReaderOffset)
         return false;
     dataOffset = static_cast<uint32_t>(declaredEnd);
     return true;
@@ -261,7 +261,7 @@ bool CNitfImage::ReadMaskTable(SubheaderCursor& cursor)
         !cursor.Binary(2, TMRLNTH) || !cursor.Binary(2, TPXCDLNTH))
         return false;
     const uint64_t blockedData = uint64_t(dataOffset) + IMDATOFF;
-    if (blockedData > uint64_t(INT32_MAX))
+    if (blockedData > kLargestReaderOffset)
         return false;
     dataOffset = static_cast<uint32_t>(blockedData);
     maskTableLength = IMDATOFF;

@@ -3,6 +3,9 @@
 // rows come from the decoder's bitmaps.
 #include "nitf/NitfImage.h"
 
+#include "base/CheckedMath.h"
+#include "base/Limits.h"
+
 #include <algorithm>
 #include <cstring>
 
@@ -10,7 +13,6 @@ namespace {
 
 constexpr unsigned kByteBits = 8;
 constexpr size_t kRgbBands = 3;
-constexpr uint64_t kMaxBlockCacheBytes = uint64_t(64) << 20; // larger strips are read a row at a time
 constexpr uint32_t kStripRows = 32; // rows of a block read at once: small enough to stay in the CPU caches
 constexpr uint64_t kNoBlock = UINT64_MAX;
 
@@ -187,7 +189,8 @@ const uint8_t* CNitfImage::CachedSpan(CFileReader& reader, const BlockPlace& pla
     const uint64_t slots = uint64_t(NBPR) * uint64_t(bandsTogether ? 1 : NBANDS);
     const uint64_t slotBytes = std::min<uint64_t>(kStripRows, uint64_t(NPPBV)) * uint64_t(NPPBH) *
                                uint64_t(bytesPerPixel) * uint64_t(bandsTogether ? NBANDS : 1);
-    if (place.bytes == 0 || place.bytes > slotBytes || slots * slotBytes > kMaxBlockCacheBytes ||
+    uint64_t cacheBytes = slots;
+    if (place.bytes == 0 || place.bytes > slotBytes || !MultiplyWithin(cacheBytes, slotBytes, kMaxBlockCacheBytes) ||
         place.start > readLimit || place.bytes > readLimit - place.start || position < place.start ||
         count > place.bytes || position - place.start > place.bytes - count || place.slot >= slots)
         return nullptr;

@@ -17,8 +17,6 @@ constexpr unsigned kHeaderLengthWidth = 6;
 constexpr unsigned kCountWidth = 3;
 constexpr unsigned kDataLengthWidth = 5;       // UDHDL, XHDL
 constexpr unsigned kOverflowWidth = 3;         // UDHOFL, XHDLOFL
-// Offsets are passed to 32-bit seeks; larger files are not read.
-constexpr uint64_t kLargestFile = 0x7FFFFFFF;
 // The length of the RPFHDR user-defined data: UDHOFL, tag, length and 48 bytes of header.
 constexpr int32_t kRpfUserHeaderLength = 62;
 constexpr char kRpfHeaderTag[] = "RPFHDR";
@@ -123,7 +121,7 @@ bool CNitfFileHeader::Parse()
         if (!reader.HoldsFile())
             return false;
         uint64_t fileSize = reader.FileSize();
-        if (fileSize > kLargestFile)
+        if (fileSize > kLargestReaderOffset)
             return false;
 
         reader.ReadBytes(headerText, kVersionTextSize);

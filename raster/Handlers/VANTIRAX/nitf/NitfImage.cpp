@@ -2,6 +2,8 @@
 // decoder for compressed images.
 #include "nitf/NitfImage.h"
 
+#include "base/CheckedMath.h"
+#include "base/Limits.h"
 #include "imaging/JpegMarkers.h"
 
 #include <algorithm>
@@ -14,15 +16,6 @@ constexpr int32_t kGreyPaletteSize = 256;
 constexpr int32_t kLastPaletteIndex = 255;
 constexpr unsigned kRgbTables = 3;
 constexpr uint32_t kRgbPixelBytes = 3;
-
-// product *= factor, false when the product would pass limit.
-bool MultiplyWithin(uint64_t& product, uint64_t factor, uint64_t limit)
-{
-    if (factor != 0 && product > limit / factor)
-        return false;
-    product *= factor;
-    return product <= limit;
-}
 
 bool IsMonoDepth(int32_t NBPP)
 {
@@ -75,7 +68,7 @@ bool CNitfImage::PrepareData(CFileReader& reader, uint32_t dataLength)
 {
     isPrepared = 0;
     FreeVector(streamIndex);
-    readLimit = std::min<uint64_t>(reader.FileSize(), uint64_t(INT32_MAX));
+    readLimit = std::min(reader.FileSize(), kLargestReaderOffset);
     if (!ValidGeometry())
         return false;
     bool served = false;
@@ -159,7 +152,7 @@ bool CNitfImage::DataFitsFile() const
         return false;
     if (isMasked) {
         for (uint32_t blockOffset : blockOffsets)
-            if (blockOffset != kBlockNotStored && (blockOffset > available || storedBlock > available - blockOffset))
+            if (blockOffset != kBlockNotStored && !SpanWithin(blockOffset, storedBlock, available))
                 return false;
         return true;
     }

@@ -14,7 +14,7 @@ public:
 
     bool SeekTo(uint64_t offset)
     {
-        if (offset > fileSize || offset > uint64_t(INT32_MAX))
+        if (offset > fileSize || offset > kLargestReaderOffset)
             return false;
         reader.SeekTo(static_cast<int32_t>(offset), kSeekSet);
         return reader.error != kSeekFailed && reader.position == offset;

@@ -4,15 +4,14 @@
 #pragma once
 
 #include "base/ByteOrder.h"
+#include "base/CheckedMath.h"
 #include "base/FileReader.h"
+#include "base/Limits.h"
 
 #include <cstdint>
 
 static_assert(__BYTE_ORDER__ == __ORDER_LITTLE_ENDIAN__,
               "RPF fields are byte-reversed for big-endian frames on a little-endian host");
-
-// The largest offset the file reader can seek to.
-constexpr uint64_t kMaxSeekOffset = 0x7FFFFFFF;
 
 // Reads one 2-, 4- or 8-byte field and brings it into host order: a frame
 // whose endian indicator is 0x00 stores every number most significant byte first.
@@ -32,16 +31,16 @@ inline void ReadText(CFileReader& reader, char* text, uint32_t width)
 }
 
 // True when length bytes from location lie wholly inside a file of fileSize bytes.
-inline bool FitsInFile(uint64_t location, uint64_t length, uint64_t fileSize)
+constexpr bool FitsInFile(uint64_t location, uint64_t length, uint64_t fileSize)
 {
-    return location <= fileSize && length <= fileSize - location;
+    return SpanWithin(location, length, fileSize);
 }
 
 // Seeks to an absolute location; false (without seeking) when the location
 // lies past the end of the file or beyond what the reader can seek to.
 inline bool SeekToLocation(CFileReader& reader, uint64_t location)
 {
-    if (location > kMaxSeekOffset || location > reader.FileSize())
+    if (location > kLargestReaderOffset || location > reader.FileSize())
         return false;
     reader.SeekTo(static_cast<int32_t>(location), kSeekSet);
     return !reader.Failed();

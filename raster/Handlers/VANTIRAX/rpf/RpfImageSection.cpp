@@ -1,5 +1,6 @@
 #include "rpf/RpfImageSection.h"
 
+#include "base/Limits.h"
 #include "rpf/RpfFieldReader.h"
 #include "rpf/RpfValueTable.h"
 
@@ -11,7 +12,6 @@ constexpr uint32_t kNoMaskTable = 0xFFFFFFFF;
 constexpr uint64_t kMaskedSubframeStart = 0xFFFFFFFF;
 constexpr uint8_t kCodeBits = 12; // the only code length of CADRG and CIB frames
 constexpr uint32_t kNoSubframe = 0xFFFFFFFF;
-constexpr uint64_t kMaxSubframeCacheBytes = 1 << 20; // a row of larger subframes is read a code row at a time
 
 } // namespace
 
@@ -139,7 +139,7 @@ const uint8_t* RpfImageSection::CachedCodeRow(CFileReader& reader, uint32_t subf
 {
     const uint64_t cacheBytes = uint64_t(subframesEastWest) * bytesPerSubframe;
     if (cacheBytes > kMaxSubframeCacheBytes || !FitsInFile(start, bytesPerSubframe, fileSize) ||
-        start > kMaxSeekOffset)
+        start > kLargestReaderOffset)
         return nullptr;
     if (subframeCache.empty()) {
         subframeCache.assign(cacheBytes, 0);
@@ -162,7 +162,7 @@ const uint8_t* RpfImageSection::ReadCodeRowBytes(CFileReader& reader, uint64_t r
 {
     // Checked here rather than left to a short read, whose end-of-file flag
     // would fail every later line of the draw.
-    if (!FitsInFile(rowStart, bytesPerCodeRow, fileSize) || rowStart > kMaxSeekOffset)
+    if (!FitsInFile(rowStart, bytesPerCodeRow, fileSize) || rowStart > kLargestReaderOffset)
         return nullptr;
     reader.SeekTo(static_cast<int32_t>(rowStart), kSeekSet);
     reader.ReadBytes(rawCodeRow.data(), bytesPerCodeRow);
