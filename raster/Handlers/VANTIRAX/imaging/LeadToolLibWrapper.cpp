@@ -1,6 +1,7 @@
 #include "imaging/LeadToolLibWrapper.h"
 
 #include "base/ByteOrder.h"
+#include "base/CheckedRead.h"
 #include "base/Limits.h"
 #include "imaging/JpegMarkers.h"
 #include "imaging/NitfJpegDefaults.h"
@@ -19,7 +20,6 @@ const char* const kOutOfMemoryText = "CLeadToolLibWrapper::openJPEGBitmap. Not e
 namespace {
 
 constexpr uint32_t kScanChunkSize = 32 * 1024; // one read per chunk: a stream costs few system calls
-
 // NITF blocks are at most 8192 pixels a side, unless the image is one block.
 constexpr uint32_t kLargestNitfBlockSide = 8192;
 
@@ -40,22 +40,8 @@ void ClearReadFailure(CFileReader& reader)
     reader.endOfFile = 0;
 }
 
-bool SeekAndRead(CFileReader& reader, uint64_t offset, void* buffer, uint32_t count)
-{
-    if (offset > kLargestReaderOffset)
-        return false;
-    reader.SeekTo(static_cast<int32_t>(offset), kSeekSet);
-    reader.ReadBytes(buffer, count);
-    return !reader.Failed();
-}
-
-// The end of what CFileReader can reach of the file.
-uint64_t ReadableEnd(const CFileReader& reader)
-{
-    return std::min<uint64_t>(reader.FileSize(), kLargestReaderOffset + 1);
-}
-
-// A stretch of the file as the marker walk sees it, read a chunk at a time.
+// A stretch of the file as the marker walk sees it, read a chunk at a time;
+// the stretch lies within the file, so reads are checked against its end.
 class FileStreamBytes : public JpegBytes {
 public:
     FileStreamBytes(CFileReader& fileReader, uint64_t startOffset, uint64_t byteCount)
@@ -66,7 +52,7 @@ public:
     const uint8_t* Window(uint64_t at, size_t& count) override
     {
         count = size_t(std::min<uint64_t>(kScanChunkSize, size - at));
-        if (!SeekAndRead(reader, start + at, chunk, uint32_t(count))) {
+        if (!CheckedRead(reader, start + size, start + at, chunk, count)) {
             ClearReadFailure(reader);
             return nullptr;
         }
@@ -255,7 +241,7 @@ bool CLeadToolLibWrapper::Open(CFileReader& reader, uint32_t dataOffset, uint32_
 // The first segment after the first stream's SOI must be the NITF APP6 segment.
 bool CLeadToolLibWrapper::ReadNitfApp6(CFileReader& reader, uint32_t dataOffset)
 {
-    const uint64_t fileEnd = ReadableEnd(reader);
+    const uint64_t fileEnd = ReachableBytes(reader.FileSize());
     if (dataOffset >= fileEnd)
         return false;
     FileStreamBytes bytes(reader, dataOffset, fileEnd - dataOffset);
@@ -263,7 +249,7 @@ bool CLeadToolLibWrapper::ReadNitfApp6(CFileReader& reader, uint32_t dataOffset)
     JpegSegment segment;
     const bool found =
         walk.Next(segment) && walk.Next(segment) && segment.code == kApplication6 && segment.length + 4 >= kApp6Size;
-    if (!found || !SeekAndRead(reader, uint64_t(dataOffset) + segment.marker, app6, kApp6Size)) {
+    if (!found || !CheckedRead(reader, fileEnd, uint64_t(dataOffset) + segment.marker, app6, kApp6Size)) {
         ClearReadFailure(reader);
         return false;
     }
@@ -295,7 +281,7 @@ bool CLeadToolLibWrapper::openJPEGBitmap(CFileReader& reader, uint32_t dataOffse
         throw std::runtime_error(kReinitialisedText);
     // A block count that the data cannot hold at the smallest decodable
     // stream each is refused before anything is allocated.
-    const uint64_t fileEnd = ReadableEnd(reader);
+    const uint64_t fileEnd = ReachableBytes(reader.FileSize());
     if (bitmapCount == 0 || dataOffset >= fileEnd ||
         bitmapCount > (fileEnd - dataOffset) / kSmallestDecodableJpegBytes ||
         (!streamOffsets.empty() && streamOffsets.size() != bitmapCount))
@@ -376,7 +362,7 @@ bool CLeadToolLibWrapper::LoadWithDefaultTables(CFileReader& reader, const Imagi
     std::unique_ptr<uint8_t[]> stream(new (std::nothrow) uint8_t[room]);
     if (!stream)
         throw std::runtime_error(kOutOfMemoryText);
-    if (!SeekAndRead(reader, offset, stream.get(), length)) {
+    if (!CheckedRead(reader, reader.FileSize(), offset, stream.get(), length)) {
         ClearReadFailure(reader);
         return false;
     }
@@ -409,9 +395,9 @@ bool CLeadToolLibWrapper::openBiLevelBitmap(CFileReader& reader, uint32_t dataOf
         throw std::runtime_error(kReinitialisedText);
     bitmapCount = 1;
     // Every coded row takes at least one bit of the strip.
-    uint64_t fileSize = reader.FileSize();
-    if (LI == 0 || dataOffset > fileSize || LI > fileSize - dataOffset || LI > UINT32_MAX - kBiLevelHeaderSize ||
-        NCOLS == 0 || NROWS == 0 || NROWS / 8 > LI)
+    // Readable holds LI below 2 GiB, so the wrapped total cannot wrap around.
+    const uint64_t fileSize = reader.FileSize();
+    if (LI == 0 || !Readable(dataOffset, LI, fileSize) || NCOLS == 0 || NROWS == 0 || NROWS / 8 > LI)
         return false;
     AllocateBitmaps(library);
     const uint32_t total = LI + kBiLevelHeaderSize;
@@ -424,7 +410,7 @@ bool CLeadToolLibWrapper::openBiLevelBitmap(CFileReader& reader, uint32_t dataOf
     PutBigEndian32(tiffHeader + kTiffStripByteCountsValue, LI);
     PutBigEndian32(tiffHeader + kTiffT4OptionsValue, oneDimensional ? kT4OneDimensional : kT4TwoDimensional);
     std::memcpy(file.get(), tiffHeader, kBiLevelHeaderSize);
-    if (!SeekAndRead(reader, dataOffset, file.get() + kBiLevelHeaderSize, LI))
+    if (!CheckedRead(reader, fileSize, dataOffset, file.get() + kBiLevelHeaderSize, LI))
         return false;
     LOADFILEOPTION options {};
     library.L_GetDefaultLoadFileOption(&options, sizeof options);

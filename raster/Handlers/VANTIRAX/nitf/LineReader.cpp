@@ -3,7 +3,7 @@
 // rows come from the decoder's bitmaps.
 #include "nitf/NitfImage.h"
 
-#include "base/CheckedMath.h"
+#include "base/CheckedRead.h"
 #include "base/Limits.h"
 
 #include <algorithm>
@@ -191,8 +191,8 @@ const uint8_t* CNitfImage::CachedSpan(CFileReader& reader, const BlockPlace& pla
                                uint64_t(bytesPerPixel) * uint64_t(bandsTogether ? NBANDS : 1);
     uint64_t cacheBytes = slots;
     if (place.bytes == 0 || place.bytes > slotBytes || !MultiplyWithin(cacheBytes, slotBytes, kMaxBlockCacheBytes) ||
-        place.start > readLimit || place.bytes > readLimit - place.start || position < place.start ||
-        count > place.bytes || position - place.start > place.bytes - count || place.slot >= slots)
+        !Readable(place.start, place.bytes, readLimit) || position < place.start ||
+        !SpanWithin(position - place.start, count, place.bytes) || place.slot >= slots)
         return nullptr;
     if (blockCache.size() != slots * slotBytes) {
         blockCache.assign(slots * slotBytes, 0);
@@ -201,37 +201,26 @@ const uint8_t* CNitfImage::CachedSpan(CFileReader& reader, const BlockPlace& pla
     uint8_t* held = blockCache.data() + place.slot * slotBytes;
     if (cachedBlocks[place.slot] != place.start) {
         cachedBlocks[place.slot] = kNoBlock;
-        reader.SeekTo(static_cast<int32_t>(place.start), kSeekSet);
-        if (reader.error == kSeekFailed || reader.position != place.start)
-            return nullptr;
-        reader.ReadBytes(held, static_cast<uint32_t>(place.bytes));
-        if (reader.error == kSeekFailed || reader.position - place.start != place.bytes)
+        if (!CheckedRead(reader, readLimit, place.start, held, place.bytes))
             return nullptr;
         cachedBlocks[place.slot] = place.start;
     }
     return held + (position - place.start);
 }
 
-// The span's bytes, from the block cache or with one seek and one read into
-// the line buffer; false when the bytes are not all in the file (a short
-// final block) or do not fit the buffer.
+// The span's bytes, from the block cache or with one read into the line
+// buffer; false when the bytes are not all in the file (a short final block)
+// or do not fit the buffer.
 bool CNitfImage::ReadSpan(CFileReader& reader, const BlockPlace& place, uint64_t position, uint64_t count,
                           const uint8_t*& data)
 {
-    if (count > lineBuffer.size() || position > readLimit || count > readLimit - position)
+    if (count > lineBuffer.size())
         return false;
     data = CachedSpan(reader, place, position, count);
     if (data != nullptr)
         return true;
     data = lineBuffer.data();
-    // Spans that follow one another in the file (the bands of a row stored
-    // by row) need no seek between them.
-    if (reader.position != position)
-        reader.SeekTo(static_cast<int32_t>(position), kSeekSet);
-    if (reader.error == kSeekFailed || reader.position != position)
-        return false;
-    reader.ReadBytes(lineBuffer.data(), static_cast<uint32_t>(count));
-    return reader.error != kSeekFailed && reader.position - position == count;
+    return CheckedRead(reader, readLimit, position, lineBuffer.data(), count);
 }
 
 // Writes byte `band` of n output pixels from source pixels sourceStride bytes

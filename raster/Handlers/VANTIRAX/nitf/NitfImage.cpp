@@ -3,7 +3,7 @@
 #include "nitf/NitfImage.h"
 
 #include "base/CheckedMath.h"
-#include "base/Limits.h"
+#include "base/CheckedRead.h"
 #include "imaging/JpegMarkers.h"
 
 #include <algorithm>
@@ -68,7 +68,7 @@ bool CNitfImage::PrepareData(CFileReader& reader, uint32_t dataLength)
 {
     isPrepared = 0;
     FreeVector(streamIndex);
-    readLimit = std::min(reader.FileSize(), kLargestReaderOffset);
+    readLimit = ReachableBytes(reader.FileSize());
     if (!ValidGeometry())
         return false;
     bool served = false;

@@ -5,16 +5,16 @@
 // ones from the embedded decoder.
 #pragma once
 
+#include "base/FileReader.h"
 #include "imaging/LeadToolLibWrapper.h"
 #include "nitf/NitfBand.h"
-#include "base/FileReader.h"
 
 #include <cstdint>
 #include <memory>
 #include <vector>
 
 class CNitfFileHeader;
-class SubheaderCursor;
+class FileCursor;
 
 template <typename T>
 void FreeVector(std::vector<T>& values)
@@ -133,14 +133,14 @@ private:
     };
 
     // Subheader steps.
-    bool ReadFront(SubheaderCursor& cursor, uint32_t offset);
-    bool ReadCorners(SubheaderCursor& cursor);
-    bool ReadCompression(SubheaderCursor& cursor);
-    bool ReadBands(SubheaderCursor& cursor);
-    bool ReadBlocking(SubheaderCursor& cursor);
-    bool ReadExtensions(SubheaderCursor& cursor);
-    bool PlaceData(SubheaderCursor& cursor, uint32_t offset);
-    bool ReadMaskTable(SubheaderCursor& cursor);
+    bool ReadFront(FileCursor& cursor, uint32_t offset);
+    bool ReadCorners(FileCursor& cursor);
+    bool ReadCompression(FileCursor& cursor);
+    bool ReadBands(FileCursor& cursor);
+    bool ReadBlocking(FileCursor& cursor);
+    bool ReadExtensions(FileCursor& cursor);
+    bool PlaceData(FileCursor& cursor, uint32_t offset);
+    bool ReadMaskTable(FileCursor& cursor);
     void ClearParsed();
 
     // Data steps.

@@ -42,9 +42,8 @@ bool FillPalette(RpfColorGraySection& colors, uint8_t* entries)
 
 int32_t CRasterHandler::RpfOpen(RHHandle* handle, CFileReader& reader, const CNitfFileHeader& header)
 {
-    if (header.userHeaderOffset == kNoUserHeader || header.userHeaderOffset > UINT32_MAX - kRpfHeaderDataOffset)
-        return 0;
-    if (!rpfReader.Open(reader, header.userHeaderOffset + kRpfHeaderDataOffset))
+    if (header.userHeaderOffset == kNoUserHeader ||
+        !rpfReader.Open(reader, uint64_t(header.userHeaderOffset) + kRpfHeaderDataOffset))
         return 0;
     handle->width = kRpfFrameSize;
     handle->height = kRpfFrameSize;

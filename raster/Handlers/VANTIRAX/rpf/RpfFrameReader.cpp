@@ -7,7 +7,7 @@ namespace {
 constexpr uint32_t kCommonKernelWidth = 4; // CADRG and CIB kernels are 4 x 4
 }
 
-bool CRpfFrameReader::Open(CFileReader& reader, uint32_t headerSectionOffset)
+bool CRpfFrameReader::Open(CFileReader& reader, uint64_t headerSectionOffset)
 {
     if (!headerSection.ReadHeaderSection(reader, headerSectionOffset))
         return false;
