@@ -14,7 +14,6 @@ namespace {
 constexpr unsigned kByteBits = 8;
 constexpr size_t kRgbBands = 3;
 constexpr uint32_t kStripRows = 32; // rows of a block read at once: small enough to stay in the CPU caches
-constexpr uint64_t kNoBlock = UINT64_MAX;
 
 } // namespace
 
@@ -163,8 +162,7 @@ bool CNitfImage::ReadBandSpan(CFileReader& reader, uint64_t blockStart, uint32_t
 
 void CNitfImage::ReleaseBlockCache()
 {
-    FreeVector(blockCache);
-    FreeVector(cachedBlocks);
+    blockCache.Release();
 }
 
 // The strip of rows rowInBlock belongs to, in a plane of pixelBytes-byte
@@ -190,22 +188,12 @@ const uint8_t* CNitfImage::CachedSpan(CFileReader& reader, const BlockPlace& pla
     const uint64_t slotBytes = std::min<uint64_t>(kStripRows, uint64_t(NPPBV)) * uint64_t(NPPBH) *
                                uint64_t(bytesPerPixel) * uint64_t(bandsTogether ? NBANDS : 1);
     uint64_t cacheBytes = slots;
-    if (place.bytes == 0 || place.bytes > slotBytes || !MultiplyWithin(cacheBytes, slotBytes, kMaxBlockCacheBytes) ||
-        !Readable(place.start, place.bytes, readLimit) || position < place.start ||
-        !SpanWithin(position - place.start, count, place.bytes) || place.slot >= slots)
+    if (!MultiplyWithin(cacheBytes, slotBytes, kMaxBlockCacheBytes) || position < place.start ||
+        !SpanWithin(position - place.start, count, place.bytes))
         return nullptr;
-    if (blockCache.size() != slots * slotBytes) {
-        blockCache.assign(slots * slotBytes, 0);
-        cachedBlocks.assign(slots, kNoBlock);
-    }
-    uint8_t* held = blockCache.data() + place.slot * slotBytes;
-    if (cachedBlocks[place.slot] != place.start) {
-        cachedBlocks[place.slot] = kNoBlock;
-        if (!CheckedRead(reader, readLimit, place.start, held, place.bytes))
-            return nullptr;
-        cachedBlocks[place.slot] = place.start;
-    }
-    return held + (position - place.start);
+    blockCache.Shape(slots, slotBytes);
+    const uint8_t* strip = blockCache.Fetch(reader, readLimit, place.slot, place.start, place.bytes);
+    return strip == nullptr ? nullptr : strip + (position - place.start);
 }
 
 // The span's bytes, from the block cache or with one read into the line

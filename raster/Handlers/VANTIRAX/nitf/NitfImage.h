@@ -6,6 +6,7 @@
 #pragma once
 
 #include "base/FileReader.h"
+#include "base/SlotCache.h"
 #include "imaging/LeadToolLibWrapper.h"
 #include "nitf/NitfBand.h"
 
@@ -121,9 +122,8 @@ private:
     // Strips of rows of the uncompressed blocks being read, one slot per block
     // column (per band and block column in IMODE "B" and "S"), so that a strip
     // costs one file read rather than one per row. Empty when they would take
-    // more than kMaxBlockCacheBytes; cachedBlocks holds each slot's file offset.
-    std::vector<uint8_t> blockCache;
-    std::vector<uint64_t> cachedBlocks;
+    // more than kMaxBlockCacheBytes.
+    SlotCache blockCache;
 
     // Where one strip of a block (of every band, or of one band) lies.
     struct BlockPlace {

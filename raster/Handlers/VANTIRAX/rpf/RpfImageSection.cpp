@@ -11,7 +11,6 @@ namespace {
 constexpr uint32_t kNoMaskTable = 0xFFFFFFFF;
 constexpr uint64_t kMaskedSubframeStart = 0xFFFFFFFF;
 constexpr uint8_t kCodeBits = 12; // the only code length of CADRG and CIB frames
-constexpr uint32_t kNoSubframe = 0xFFFFFFFF;
 constexpr uint32_t kDescriptionBytes = 6 * 2 + 4 * 4;
 constexpr uint32_t kMaskHeaderBytes = 3 * 2;
 constexpr uint32_t kDisplayParametersBytes = 2 * 4 + 1;
@@ -135,8 +134,7 @@ bool RpfImageSection::SubframeStart(uint32_t subframe, uint64_t& start) const
 
 void RpfImageSection::ReleaseSubframeCache()
 {
-    subframeCache = std::vector<uint8_t>();
-    cachedSubframes = std::vector<uint32_t>();
+    subframeCache.Release();
 }
 
 // The bytes of a code row from the subframe cache, reading the whole subframe
@@ -146,22 +144,11 @@ void RpfImageSection::ReleaseSubframeCache()
 const uint8_t* RpfImageSection::CachedCodeRow(CFileReader& reader, uint32_t subframe, uint64_t start,
                                               uint32_t codeRow)
 {
-    const uint64_t cacheBytes = uint64_t(subframesEastWest) * bytesPerSubframe;
-    if (cacheBytes > kMaxSubframeCacheBytes || !Readable(start, bytesPerSubframe, fileSize))
+    if (uint64_t(subframesEastWest) * bytesPerSubframe > kMaxSubframeCacheBytes)
         return nullptr;
-    if (subframeCache.empty()) {
-        subframeCache.assign(cacheBytes, 0);
-        cachedSubframes.assign(subframesEastWest, kNoSubframe);
-    }
-    const uint32_t slot = subframe % subframesEastWest;
-    uint8_t* held = subframeCache.data() + size_t(slot) * bytesPerSubframe;
-    if (cachedSubframes[slot] != subframe) {
-        cachedSubframes[slot] = kNoSubframe;
-        if (!CheckedRead(reader, fileSize, start, held, bytesPerSubframe))
-            return nullptr;
-        cachedSubframes[slot] = subframe;
-    }
-    return held + size_t(codeRow) * bytesPerCodeRow;
+    subframeCache.Shape(subframesEastWest, bytesPerSubframe);
+    const uint8_t* held = subframeCache.Fetch(reader, fileSize, subframe % subframesEastWest, start, bytesPerSubframe);
+    return held == nullptr ? nullptr : held + size_t(codeRow) * bytesPerCodeRow;
 }
 
 // Refused before the read rather than left to a short read, whose end-of-file
