@@ -1,7 +1,7 @@
-// Field-level reading shared by the RPF section readers: the fixed part of a
-// section, or a run of its records, is read whole through CheckedRead; its
-// numbers (in the frame's byte order) and character fields are then taken
-// from memory in order.
+// Field-level reading shared by the RPF section readers: a section's
+// fixed-size fields, or a run of its records, are read whole through
+// CheckedRead; their numbers (in the frame's byte order) and character
+// fields are then taken from memory in order.
 #pragma once
 
 #include "base/ByteOrder.h"
