@@ -83,10 +83,7 @@ void CutFile(const fs::path& file)
     CFileReader reader;
     reader.OpenFile(file.c_str(), kShareDenyWrite);
     CNitfImage image;
-    image.version21 = header.version21;
-    image.fixedLayout = header.fixedLayout;
-    image.subheaderLength = segment.subheaderLength;
-    if (!image.ReadSubheader(reader, header.HL) || image.isMasked || image.dataOffset >= bytes.size())
+    if (!image.ReadSubheader(reader, header) || image.isMasked || image.dataOffset >= bytes.size())
         return;
     const std::string data = bytes.substr(image.dataOffset, segment.dataLength);
     const auto side = [](int32_t value) { return uint32_t(std::max(value, 1) - 1); };

@@ -329,3 +329,25 @@ TEST(Image, JpegBlockStreamsAsEncodersWriteThem)
 }
 
 } // namespace
+// Block records may make blocks overlap: block 1 starts at row 32 of block 0,
+// so its first strip starts where block 0's short last strip does, and must
+// not be served from that strip's slot.
+TEST(Image, OverlappingMaskedBlocksEachGiveTheirOwnRows)
+{
+    NitfImagePlan plan;
+    plan.rows = 80;
+    plan.columns = 4;
+    plan.IC = "NM";
+    plan.NBPC = 2;
+    plan.NPPBH = 4;
+    plan.NPPBV = 40;
+    std::string data(288, '\0');
+    for (size_t i = 0; i < data.size(); ++i)
+        data[i] = char(i * 7);
+    LoadedImage loaded(BuildImageFile(plan, BuildMaskTable({0, 128}) + data));
+    ASSERT_TRUE(loaded.Open());
+    for (uint32_t row = 0; row < 80; ++row) {
+        const std::string expected = data.substr((row < 40 ? row : row - 8) * 4, 4);
+        EXPECT_EQ(Head(loaded.Row(row), 4), std::vector<uint8_t>(expected.begin(), expected.end())) << row;
+    }
+}

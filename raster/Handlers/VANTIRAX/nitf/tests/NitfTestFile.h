@@ -27,10 +27,7 @@ struct LoadedImage {
         if (!header.Parse() || header.NUMI < 1)
             return false;
         reader.OpenFile(path.c_str(), kShareDenyWrite);
-        image.fixedLayout = header.fixedLayout;
-        image.version21 = header.version21;
-        image.subheaderLength = header.imageSegments[0].subheaderLength;
-        return image.ReadSubheader(reader, header.HL);
+        return image.ReadSubheader(reader, header);
     }
     // Parse, PrepareData, AllocLineBuffer and OpenCompressed, as an open does.
     bool Open()
