@@ -4,6 +4,7 @@
 // files, JPEG streams of every lossless predictor and default table, and
 // MGRS references and image corners.
 //   fuzz_seeds OUTPUT_DIR [SAMPLE_DIR...]
+#include "base/MemoryFiles.h"
 #include "nitf/NitfFileHeader.h"
 #include "nitf/NitfImage.h"
 #include "tests/SampleFiles.h"
@@ -72,6 +73,9 @@ void CutFile(const fs::path& file)
     CNitfFileHeader header;
     header.SetPath(file.c_str());
     const std::string name = file.filename().string(), bytes = ReadWholeFile(file.string());
+#ifdef VX_MEMORY_FILES
+    memoryfiles::Publish(file.c_str(), reinterpret_cast<const uint8_t*>(bytes.data()), bytes.size());
+#endif
     if (!header.Parse() || header.NUMI < 1 || header.HL >= bytes.size())
         return;
     if (header.HasRpfHeader())
