@@ -1,12 +1,48 @@
 #include "FuzzFile.h"
 
+#ifdef VX_MEMORY_FILES
+#include "base/MemoryFiles.h"
+#endif
+
 #include <algorithm>
 #include <cstdio>
 #include <cstring>
 #include <cstdlib>
 #include <unistd.h>
+#include <vector>
 
 namespace {
+
+constexpr size_t kFileLengthOffsets[] = {342, 382};
+constexpr size_t kFileLengthWidth = 12;
+
+bool AllDigits(const uint8_t* field, size_t width)
+{
+    return std::all_of(field, field + width, [](uint8_t c) { return c >= '0' && c <= '9'; });
+}
+
+#ifdef VX_MEMORY_FILES
+
+// The fuzzing build reads through in-memory file calls: the input is
+// published under a fixed name instead of being written to a file.
+std::vector<uint8_t> publishedInput;
+
+} // namespace
+
+const std::string& FuzzFilePath()
+{
+    static const std::string path = "fuzz-input";
+    return path;
+}
+
+bool WriteFuzzFile(const uint8_t* data, size_t size)
+{
+    publishedInput.assign(data, data + size);
+    memoryfiles::Publish(FuzzFilePath().c_str(), publishedInput.data(), publishedInput.size());
+    return true;
+}
+
+#else
 
 std::string CreateFuzzFile()
 {
@@ -17,14 +53,6 @@ std::string CreateFuzzFile()
         std::abort();
     close(descriptor);
     return pattern;
-}
-
-constexpr size_t kFileLengthOffsets[] = {342, 382};
-constexpr size_t kFileLengthWidth = 12;
-
-bool AllDigits(const uint8_t* field, size_t width)
-{
-    return std::all_of(field, field + width, [](uint8_t c) { return c >= '0' && c <= '9'; });
 }
 
 struct FuzzFile {
@@ -48,6 +76,8 @@ bool WriteFuzzFile(const uint8_t* data, size_t size)
     const bool written = std::fwrite(data, 1, size, stream) == size;
     return std::fclose(stream) == 0 && written;
 }
+
+#endif
 
 void DeclareInputLength(uint8_t* data, size_t size)
 {

@@ -1,14 +1,16 @@
-// The readers take paths, so every target writes its input to one file per
-// process and hands that path on.
+// The readers take paths, so every target hands its input on under one path
+// per process: published in memory in the fuzzing build (VX_FILE_CALLS
+// memory), written to a file in the replay programs of the other builds.
 #pragma once
 
 #include <cstddef>
 #include <cstdint>
 #include <string>
 
-// The process's input file, created on first use and removed at exit.
+// The path of the process's input; a file is created on first use and
+// removed at exit.
 const std::string& FuzzFilePath();
-// Replaces the file's content with the input; false when it cannot be written.
+// Replaces the input's content; false when it cannot be written.
 bool WriteFuzzFile(const uint8_t* data, size_t size);
 
 // Sets a NITF header's FL field (at offset 342, or 382 in NITF 2.0 with a

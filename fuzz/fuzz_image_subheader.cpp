@@ -1,7 +1,7 @@
 // The first image segment of a plain NITF file: subheader parse, data
 // preparation, decode of compressed kinds and rows up to a pixel budget.
-// Input: a 4-byte control prefix (byte 0: bit 0 NITF 2.1 layout, bit 1 FL
-// at the fixed offset; bytes 1-3: LISH, 0 when not known), then the
+// Input: a 4-byte control prefix (byte 0: bit 0 NITF 2.1 layout, bit 1 not
+// used; bytes 1-3: LISH, 0 when not known), then the
 // subheader and its image data as they stand in the file.
 #include "FuzzFile.h"
 #include "nitf/NitfImage.h"
@@ -38,7 +38,6 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size)
     reader.OpenFile(FuzzFilePath().c_str(), kShareDenyWrite);
     CNitfImage image;
     image.version21 = data[0] & 1;
-    image.fixedLayout = (data[0] >> 1) & 1;
     image.subheaderLength = PrefixNumber(data + 1, 3);
     if (!image.ReadSubheader(reader, 0))
         return 0;

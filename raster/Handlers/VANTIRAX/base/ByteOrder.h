@@ -1,6 +1,6 @@
 // Byte-order reversal for the binary fields of RPF frames (big-endian when the
-// frame's endian indicator is 0x00), the NITF mask table and the JPEG APP6
-// segment, which store their numbers most significant byte first.
+// frame's endian indicator is 0x00), the NITF mask table, JPEG segments and
+// the bi-level TIFF wrapper, which store their numbers most significant byte first.
 #pragma once
 
 #include <cstdint>
@@ -32,4 +32,17 @@ inline uint32_t BigEndian32(const uint8_t* bytes)
 inline uint16_t BigEndian16(const uint8_t* bytes)
 {
     return static_cast<uint16_t>((bytes[0] << 8) | bytes[1]);
+}
+
+// Writes a number most significant byte first.
+constexpr void PutBigEndian16(uint8_t* bytes, uint32_t value)
+{
+    bytes[0] = static_cast<uint8_t>(value >> 8);
+    bytes[1] = static_cast<uint8_t>(value);
+}
+
+constexpr void PutBigEndian32(uint8_t* bytes, uint32_t value)
+{
+    PutBigEndian16(bytes, value >> 16);
+    PutBigEndian16(bytes + 2, value);
 }

@@ -3,12 +3,13 @@
 // flags, so a caller can issue a series of reads and seeks and test once.
 #pragma once
 
+#include "base/Limits.h"
+
 #include <cstdint>
 
 constexpr uint32_t kNoFile = 0xFFFFFFFF;        // handle value after a failed open
 constexpr uint32_t kShareDenyWrite = 0x20;      // open mode: read access, deny writers
 constexpr int32_t kSeekFailed = -1;
-constexpr unsigned kReaderPathSize = 260;       // path bytes including the terminator
 
 enum SeekOrigin : int { kSeekSet = 0, kSeekCurrent = 1, kSeekEnd = 2 };
 

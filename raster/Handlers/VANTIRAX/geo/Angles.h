@@ -1,5 +1,6 @@
 // Angle units of the geolocation code: its interfaces take radians, while
-// zone and band rules are stated in whole degrees.
+// zone and band rules are stated in whole degrees. Also the range check its
+// angles and grid coordinates are held to.
 #pragma once
 
 constexpr double kPi = 3.14159265358979323846;
@@ -8,6 +9,12 @@ constexpr double kHalfPi = kPi / 2.0;
 
 constexpr double DegreesToRadians(double degrees) { return degrees * (kPi / 180.0); }
 constexpr double RadiansToDegrees(double radians) { return radians * 180.0 / kPi; }
+
+// Inclusive at both ends; false for NaN.
+constexpr bool Within(double value, double low, double high)
+{
+    return value >= low && value <= high;
+}
 
 constexpr double kHalfTurnDegrees = 180.0;
 constexpr double kTurnDegrees = 360.0;

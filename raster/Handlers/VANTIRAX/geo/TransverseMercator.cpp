@@ -13,11 +13,6 @@ constexpr double kNegligibleLongitude = 2.0e-10;                // radians, trea
 constexpr double kNegligibleEasting = 0.0001;                   // metres, treated as 0
 constexpr int kFootpointIterations = 5;
 
-bool Within(double value, double low, double high)
-{
-    return value >= low && value <= high;  // false for NaN
-}
-
 // Distance along the meridian from the equator to latitude phi.
 double MeridionalArc(const TransverseMercatorParams& p, double phi)
 {

@@ -21,11 +21,6 @@ constexpr double kMaxLatitude = 1.4748032179352084;
 constexpr double kInverseMeridianOffset = 5.0e-8;
 constexpr int32_t kZonesPerHemisphereSide = 30;
 
-bool Within(double value, double low, double high)
-{
-    return value >= low && value <= high;  // false for NaN
-}
-
 // Central meridian of a zone in degrees, kept within 3 to 357 east.
 double CentralMeridianDegrees(int32_t zone)
 {

@@ -1,6 +1,7 @@
 // A TIFF file in memory holding one CCITT T.4 coded image, decoded with
 // libtiff into a 1-bit bitmap whose set bits are black. libtiff's messages
 // go to handlers of this open alone, which drop them.
+#include "base/Limits.h"
 #include "imaging/BitmapKernel.h"
 #include "imaging/FileLoader.h"
 
@@ -9,11 +10,6 @@
 #include <tiffio.h>
 
 namespace {
-
-// libtiff's own working memory grows with the declared width alone (its
-// run arrays take 16 bytes per column), which a few bytes of strip can
-// claim: no single allocation of it may pass this.
-constexpr tmsize_t kMaxLibraryAllocation = tmsize_t(256) << 20;
 
 struct MemoryTiff {
     const uint8_t* data;
@@ -117,7 +113,7 @@ bool LoadFaxTiff(const LoadRequest& request)
         return false;
     TIFFOpenOptionsSetErrorHandlerExtR(options, DropMessage, nullptr);
     TIFFOpenOptionsSetWarningHandlerExtR(options, DropMessage, nullptr);
-    TIFFOpenOptionsSetMaxSingleMemAlloc(options, kMaxLibraryAllocation);
+    TIFFOpenOptionsSetMaxSingleMemAlloc(options, tmsize_t(kMaxBiLevelLibraryAllocation));
     MemoryTiff file {request.data, request.size, 0};
     TIFF* tiff = TIFFClientOpenExt("nitf-bilevel", "rm", &file, ReadMemory, RefuseWrite, SeekMemory, CloseMemory,
                                    MemorySize, RefuseMap, NoUnmap, options);

@@ -3,7 +3,9 @@
 #include "imaging/BitmapKernel.h"
 #include "imaging/JpegMarkers.h"
 
+#include "base/CheckedMath.h"
 #include "base/FileCalls.h"
+#include "base/Limits.h"
 
 #include <cstdlib>
 #include <memory>
@@ -11,10 +13,9 @@
 
 namespace {
 
-// The largest side a JPEG frame header can declare, and the pixel store one
-// load may allocate unless the caller's options say otherwise.
+// The largest side a JPEG frame header can declare: what one load may
+// declare unless the caller's options say otherwise.
 constexpr uint32_t kDefaultMaxSide = 65535;
-constexpr uint64_t kDefaultMaxBitmapBytes = uint64_t(1) << 30;
 
 // The code of the stream's frame marker, or 0 when a scan, the end or a
 // break in the marker segments comes first.
@@ -74,7 +75,7 @@ int L_GetDefaultLoadFileOption(LOADFILEOPTION* options, uint32_t structSize)
 {
     if (options == nullptr || structSize != sizeof(LOADFILEOPTION))
         return kLoadFailed;
-    *options = LOADFILEOPTION{structSize, kDefaultMaxSide, kDefaultMaxSide, kDefaultMaxBitmapBytes};
+    *options = LOADFILEOPTION{structSize, kDefaultMaxSide, kDefaultMaxSide, kMaxDecodedImageBytes};
     return kLoadSucceeded;
 }
 
@@ -97,7 +98,7 @@ int L_LoadFileOffset(int fileHandle, uint64_t offset, uint32_t byteCount, BITMAP
         return kLoadFailed;
     uint32_t handle = static_cast<uint32_t>(fileHandle);
     uint64_t fileSize = filecalls::Size(handle);
-    if (offset > fileSize || byteCount > fileSize - offset)
+    if (!SpanWithin(offset, byteCount, fileSize))
         return kLoadFailed;
     std::unique_ptr<uint8_t[]> stream(new (std::nothrow) uint8_t[byteCount == 0 ? 1 : byteCount]);
     if (!stream || !filecalls::ReadAt(handle, offset, stream.get(), byteCount))

@@ -8,6 +8,7 @@
 // only the rows decoded before.
 #include "imaging/BitmapKernel.h"
 #include "imaging/FileLoader.h"
+#include "imaging/JpegMarkers.h"
 
 #include <csetjmp>
 #include <cstdio>
@@ -19,7 +20,6 @@ namespace {
 constexpr int kGreyComponents = 1;
 constexpr int kColourComponents = 3;
 constexpr int kWarningLevel = -1;
-constexpr int kEndOfImage = 0xD9;
 
 struct JpegErrorExit {
     jpeg_error_mgr manager;

@@ -4,8 +4,6 @@
 
 namespace {
 
-constexpr uint8_t kTemporary = 0x01;   // TEM
-
 // Markers that stand alone, without a length and payload.
 bool IsStandalone(uint8_t code)
 {

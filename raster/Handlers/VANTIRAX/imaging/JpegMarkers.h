@@ -10,23 +10,38 @@
 #include <cstdint>
 
 constexpr uint8_t kMarkerPrefix = 0xFF;
+constexpr uint8_t kTemporary = 0x01;       // TEM
+constexpr uint8_t kFirstFrame = 0xC0;      // SOF0
+constexpr uint8_t kLosslessFrame = 0xC3;   // SOF3: lossless, Huffman coded
+constexpr uint8_t kDefineHuffmanTables = 0xC4;
+constexpr uint8_t kJpegExtension = 0xC8;   // JPG
+constexpr uint8_t kDefineArithmeticConditioning = 0xCC;
+constexpr uint8_t kLastFrame = 0xCF;       // SOF15
+constexpr uint8_t kFirstRestart = 0xD0;    // RST0
+constexpr uint8_t kLastRestart = 0xD7;     // RST7
 constexpr uint8_t kStartOfImage = 0xD8;
 constexpr uint8_t kEndOfImage = 0xD9;
 constexpr uint8_t kStartOfScan = 0xDA;
-constexpr uint8_t kDefineHuffmanTables = 0xC4;
 constexpr uint8_t kDefineQuantisationTables = 0xDB;
 constexpr uint8_t kDefineRestartInterval = 0xDD;
-constexpr uint8_t kLosslessFrame = 0xC3;   // SOF3: lossless, Huffman coded
+constexpr uint8_t kApplication6 = 0xE6;    // APP6, which leads every NITF JPEG stream
 
-// SOF0 to SOF15 without DHT (C4), JPG (C8) and DAC (CC).
+// The fewest bytes a stream can take: SOI and EOI alone.
+constexpr uint32_t kMarkersOnlyJpegBytes = 2 + 2;
+// The fewest bytes of a stream that decodes to pixels: SOI, a one-component
+// frame header, a one-component scan header and EOI.
+constexpr uint32_t kSmallestDecodableJpegBytes = 2 + 13 + 10 + 2;
+
+// SOF0 to SOF15 without DHT, JPG and DAC.
 constexpr bool IsFrameMarker(uint8_t code)
 {
-    return code >= 0xC0 && code <= 0xCF && code != kDefineHuffmanTables && code != 0xC8 && code != 0xCC;
+    return code >= kFirstFrame && code <= kLastFrame && code != kDefineHuffmanTables && code != kJpegExtension &&
+           code != kDefineArithmeticConditioning;
 }
 
 constexpr bool IsRestartMarker(uint8_t code)
 {
-    return code >= 0xD0 && code <= 0xD7;
+    return code >= kFirstRestart && code <= kLastRestart;
 }
 
 // The bytes of a stream, by their distance from its first byte.

@@ -1,8 +1,10 @@
 #include "imaging/LeadToolLibWrapper.h"
 
+#include "base/ByteOrder.h"
+#include "base/CheckedRead.h"
+#include "base/Limits.h"
 #include "imaging/JpegMarkers.h"
 #include "imaging/NitfJpegDefaults.h"
-#include "base/ByteOrder.h"
 
 #include <algorithm>
 #include <cstring>
@@ -17,20 +19,9 @@ const char* const kOutOfMemoryText = "CLeadToolLibWrapper::openJPEGBitmap. Not e
 
 namespace {
 
-constexpr uint8_t kApp6 = 0xE6;
 constexpr uint32_t kScanChunkSize = 32 * 1024; // one read per chunk: a stream costs few system calls
-constexpr uint32_t kLargestReaderOffset = 0x7FFFFFFF;   // CFileReader seeks take 32-bit signed offsets
-
-// The smallest JPEG stream a block can be: SOI, a one-component frame
-// header, a one-component scan header and EOI. A block count that the data
-// cannot hold at this size is refused before anything is allocated.
-constexpr uint32_t kSmallestJpegStream = 2 + 13 + 10 + 2;
 // NITF blocks are at most 8192 pixels a side, unless the image is one block.
 constexpr uint32_t kLargestNitfBlockSide = 8192;
-// The pixels one image may hold decoded in memory.
-constexpr uint64_t kMaxImageBytes = uint64_t(1) << 30;
-// The largest factor by which an "I1" frame may have been downsampled.
-constexpr uint32_t kLargestDownsampling = 8;
 
 constexpr unsigned kGreyBits = 8;
 constexpr unsigned kColourBits = 24;
@@ -49,22 +40,8 @@ void ClearReadFailure(CFileReader& reader)
     reader.endOfFile = 0;
 }
 
-bool SeekAndRead(CFileReader& reader, uint64_t offset, void* buffer, uint32_t count)
-{
-    if (offset > kLargestReaderOffset)
-        return false;
-    reader.SeekTo(static_cast<int32_t>(offset), kSeekSet);
-    reader.ReadBytes(buffer, count);
-    return !reader.Failed();
-}
-
-// The end of what CFileReader can reach of the file.
-uint64_t ReadableEnd(const CFileReader& reader)
-{
-    return std::min<uint64_t>(reader.FileSize(), uint64_t(kLargestReaderOffset) + 1);
-}
-
-// A stretch of the file as the marker walk sees it, read a chunk at a time.
+// A stretch of the file as the marker walk sees it, read a chunk at a time;
+// the stretch lies within the file, so reads are checked against its end.
 class FileStreamBytes : public JpegBytes {
 public:
     FileStreamBytes(CFileReader& fileReader, uint64_t startOffset, uint64_t byteCount)
@@ -75,7 +52,7 @@ public:
     const uint8_t* Window(uint64_t at, size_t& count) override
     {
         count = size_t(std::min<uint64_t>(kScanChunkSize, size - at));
-        if (!SeekAndRead(reader, start + at, chunk, uint32_t(count))) {
+        if (!CheckedRead(reader, start + size, start + at, chunk, count)) {
             ClearReadFailure(reader);
             return nullptr;
         }
@@ -156,14 +133,6 @@ void ToHostOrder16(uint8_t* field)
     std::memcpy(field, &value, sizeof value);
 }
 
-void PutBigEndian32(uint8_t* field, uint32_t value)
-{
-    field[0] = static_cast<uint8_t>(value >> 24);
-    field[1] = static_cast<uint8_t>(value >> 16);
-    field[2] = static_cast<uint8_t>(value >> 8);
-    field[3] = static_cast<uint8_t>(value);
-}
-
 uint8_t ClampedByte(double value)
 {
     return static_cast<uint8_t>((value > 255.0 ? 255.0 : value) + 0.5);
@@ -218,7 +187,7 @@ void RepeatPixels(uint8_t* row, uint32_t first, uint32_t count, uint32_t factor,
 
 CLeadToolLibWrapper::CLeadToolLibWrapper()
 {
-    std::memcpy(tiffHeader, kBiLevelTiffTemplate.data(), kTiffHeaderSize);
+    std::memcpy(tiffHeader, kBiLevelTiffTemplate.data(), kBiLevelHeaderSize);
 }
 
 CLeadToolLibWrapper::~CLeadToolLibWrapper()
@@ -272,15 +241,15 @@ bool CLeadToolLibWrapper::Open(CFileReader& reader, uint32_t dataOffset, uint32_
 // The first segment after the first stream's SOI must be the NITF APP6 segment.
 bool CLeadToolLibWrapper::ReadNitfApp6(CFileReader& reader, uint32_t dataOffset)
 {
-    const uint64_t fileEnd = ReadableEnd(reader);
+    const uint64_t fileEnd = ReachableBytes(reader.FileSize());
     if (dataOffset >= fileEnd)
         return false;
     FileStreamBytes bytes(reader, dataOffset, fileEnd - dataOffset);
     JpegMarkerWalk walk(bytes);
     JpegSegment segment;
     const bool found =
-        walk.Next(segment) && walk.Next(segment) && segment.code == kApp6 && segment.length + 4 >= kApp6Size;
-    if (!found || !SeekAndRead(reader, uint64_t(dataOffset) + segment.marker, app6, kApp6Size)) {
+        walk.Next(segment) && walk.Next(segment) && segment.code == kApplication6 && segment.length + 4 >= kApp6Size;
+    if (!found || !CheckedRead(reader, fileEnd, uint64_t(dataOffset) + segment.marker, app6, kApp6Size)) {
         ClearReadFailure(reader);
         return false;
     }
@@ -310,8 +279,11 @@ bool CLeadToolLibWrapper::openJPEGBitmap(CFileReader& reader, uint32_t dataOffse
     library.L_GetDefaultLoadFileOption(&options, sizeof options);
     if (bitmaps != nullptr)
         throw std::runtime_error(kReinitialisedText);
-    const uint64_t fileEnd = ReadableEnd(reader);
-    if (bitmapCount == 0 || dataOffset >= fileEnd || bitmapCount > (fileEnd - dataOffset) / kSmallestJpegStream ||
+    // A block count that the data cannot hold at the smallest decodable
+    // stream each is refused before anything is allocated.
+    const uint64_t fileEnd = ReachableBytes(reader.FileSize());
+    if (bitmapCount == 0 || dataOffset >= fileEnd ||
+        bitmapCount > (fileEnd - dataOffset) / kSmallestDecodableJpegBytes ||
         (!streamOffsets.empty() && streamOffsets.size() != bitmapCount))
         return false;
     const uint64_t dataEnd = dataLength == 0 ? fileEnd : std::min(fileEnd, uint64_t(dataOffset) + dataLength);
@@ -334,7 +306,7 @@ bool CLeadToolLibWrapper::openJPEGBitmap(CFileReader& reader, uint32_t dataOffse
         StreamPlace stream {};
         if (!LocateStream(reader, start, end, stream))
             throw std::runtime_error(kDamagedImageText);
-        options.maxBytes = kMaxImageBytes - imageBytes;
+        options.maxBytes = kMaxDecodedImageBytes - imageBytes;
         if (!LoadBlock(reader, library, block, static_cast<uint32_t>(stream.offset), stream.length, options))
             return false;
         imageBytes += BitmapBytes(bitmaps[block]);
@@ -390,7 +362,7 @@ bool CLeadToolLibWrapper::LoadWithDefaultTables(CFileReader& reader, const Imagi
     std::unique_ptr<uint8_t[]> stream(new (std::nothrow) uint8_t[room]);
     if (!stream)
         throw std::runtime_error(kOutOfMemoryText);
-    if (!SeekAndRead(reader, offset, stream.get(), length)) {
+    if (!CheckedRead(reader, reader.FileSize(), offset, stream.get(), length)) {
         ClearReadFailure(reader);
         return false;
     }
@@ -423,12 +395,12 @@ bool CLeadToolLibWrapper::openBiLevelBitmap(CFileReader& reader, uint32_t dataOf
         throw std::runtime_error(kReinitialisedText);
     bitmapCount = 1;
     // Every coded row takes at least one bit of the strip.
-    uint64_t fileSize = reader.FileSize();
-    if (LI == 0 || dataOffset > fileSize || LI > fileSize - dataOffset || LI > UINT32_MAX - kTiffHeaderSize ||
-        NCOLS == 0 || NROWS == 0 || NROWS / 8 > LI)
+    // Readable holds LI below 2 GiB, so the wrapped total cannot wrap around.
+    const uint64_t fileSize = reader.FileSize();
+    if (LI == 0 || !Readable(dataOffset, LI, fileSize) || NCOLS == 0 || NROWS == 0 || NROWS / 8 > LI)
         return false;
     AllocateBitmaps(library);
-    uint32_t total = LI + kTiffHeaderSize;
+    const uint32_t total = LI + kBiLevelHeaderSize;
     std::unique_ptr<uint8_t[]> file(new (std::nothrow) uint8_t[total]);
     if (!file)
         throw std::runtime_error(kOutOfMemoryText);
@@ -437,14 +409,14 @@ bool CLeadToolLibWrapper::openBiLevelBitmap(CFileReader& reader, uint32_t dataOf
     PutBigEndian32(tiffHeader + kTiffRowsPerStripValue, NROWS);
     PutBigEndian32(tiffHeader + kTiffStripByteCountsValue, LI);
     PutBigEndian32(tiffHeader + kTiffT4OptionsValue, oneDimensional ? kT4OneDimensional : kT4TwoDimensional);
-    std::memcpy(file.get(), tiffHeader, kTiffHeaderSize);
-    if (!SeekAndRead(reader, dataOffset, file.get() + kTiffHeaderSize, LI))
+    std::memcpy(file.get(), tiffHeader, kBiLevelHeaderSize);
+    if (!CheckedRead(reader, fileSize, dataOffset, file.get() + kBiLevelHeaderSize, LI))
         return false;
     LOADFILEOPTION options {};
     library.L_GetDefaultLoadFileOption(&options, sizeof options);
     options.maxWidth = NCOLS;
     options.maxHeight = NROWS;
-    options.maxBytes = kMaxImageBytes;
+    options.maxBytes = kMaxDecodedImageBytes;
     FILEINFO info = FreshFileInfo();
     return library.L_LoadMemory(file.get(), bitmaps[0], sizeof(BITMAPHANDLE), kBitsAsStored, kOrderAsStored,
                                 kLoadFlagsBiLevel, nullptr, nullptr, total, &options, &info) == kLoadSucceeded;

@@ -13,14 +13,14 @@
 // every other failure is a false result.
 #pragma once
 
-#include "imaging/ImagingLibrary.h"
 #include "base/FileReader.h"
+#include "imaging/ImagingLibrary.h"
+#include "imaging/NitfJpegDefaults.h"
 
 #include <cstdint>
 #include <vector>
 
 constexpr unsigned kApp6Size = 27;          // the NITF APP6 segment from its marker on
-constexpr unsigned kTiffHeaderSize = 424;   // the bi-level TIFF wrapper; the strip follows it
 
 enum DecoderKind : int32_t { kNotPrepared = -1, kJpegDecoder = 0, kBiLevelDecoder = 1 };
 
@@ -37,7 +37,7 @@ public:
     uint32_t bandCount = 0;             // NBANDS
     uint8_t loaderConverted = 0;        // the loader delivered the last block's colours as R,G,B
     uint8_t app6[kApp6Size] = {};       // 2-byte fields at 0, 2, 12, 14 in host order
-    uint8_t tiffHeader[kTiffHeaderSize];
+    uint8_t tiffHeader[kBiLevelHeaderSize]; // the bi-level TIFF wrapper; the strip follows it
     // Masked JPEG: where each bitmap's stream starts, counted from the data
     // offset that Open is given. Empty: the streams follow one another from there.
     std::vector<uint32_t> streamOffsets;

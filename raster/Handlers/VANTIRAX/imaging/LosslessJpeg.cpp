@@ -3,6 +3,7 @@
 // decoded neighbours plus a Huffman-coded difference. Samples of up to 8
 // bits, one or three components without subsampling, one or more scans,
 // restart intervals of whole rows.
+#include "base/ByteOrder.h"
 #include "imaging/BitmapKernel.h"
 #include "imaging/FileLoader.h"
 #include "imaging/JpegMarkers.h"
@@ -98,11 +99,6 @@ struct LosslessState {
     uint32_t restartInterval;   // in samples of every scan component (MCUs)
 };
 
-uint16_t Read16(const uint8_t* bytes)
-{
-    return static_cast<uint16_t>((bytes[0] << 8) | bytes[1]);
-}
-
 bool BuildTable(const uint8_t* counts, const uint8_t* values, unsigned valueCount, HuffmanTable& table)
 {
     std::memcpy(table.values, values, valueCount);
@@ -152,8 +148,8 @@ bool ReadFrame(const uint8_t* segment, size_t length, const LOADFILEOPTION& opti
     if (state.hasFrame || length < 6)
         return false;
     frame.precision = segment[0];
-    frame.height = Read16(segment + 1);
-    frame.width = Read16(segment + 3);
+    frame.height = BigEndian16(segment + 1);
+    frame.width = BigEndian16(segment + 3);
     frame.componentCount = segment[5];
     if (frame.precision < kMinPrecision || frame.precision > kMaxPrecision ||
         (frame.componentCount != 1 && frame.componentCount != kMaxComponents) ||
@@ -298,7 +294,7 @@ bool LoadLosslessJpegStream(const LoadRequest& request)
             good = ReadHuffmanTables(segment, payload, state);
         } else if (marker.code == kDefineRestartInterval) {
             good = payload == 2;
-            state.restartInterval = good ? Read16(segment) : 0;
+            state.restartInterval = good ? BigEndian16(segment) : 0;
         } else if (marker.code == kLosslessFrame) {
             good = ReadFrame(segment, payload, *request.options, request.bitmap, state);
         } else if (marker.code == kStartOfScan) {

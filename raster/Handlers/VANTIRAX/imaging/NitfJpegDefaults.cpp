@@ -1,8 +1,11 @@
 #include "imaging/NitfJpegDefaults.h"
 
+#include "base/ByteOrder.h"
+#include "imaging/JpegMarkers.h"
+
 #include <cstddef>
 
-#define VX_DQT_HEADER 0xFF, 0xDB, 0x00, 0x43, 0x00
+#define VX_DQT_HEADER kMarkerPrefix, kDefineQuantisationTables, 0x00, 0x43, 0x00
 
 const uint8_t kDefaultDqt[kDefaultQualities][kDqtSegmentSize] = {
     {VX_DQT_HEADER, 8, 72, 72, 72, 72, 72, 72, 72, 72, 72, 78, 74, 76, 74, 78, 89, 81, 84, 84, 81, 89, 106, 93, 94,
@@ -25,7 +28,7 @@ const uint8_t kDefaultDqt[kDefaultQualities][kDqtSegmentSize] = {
 
 // The luminance DC and AC tables of ITU-T T.81 Annex K (K.3 and K.5).
 const uint8_t kDefaultDht[kDhtSegmentSize] = {
-    0xFF, 0xC4, 0x00, 0xD2,
+    kMarkerPrefix, kDefineHuffmanTables, 0x00, 0xD2,
     0x00, 0, 1, 5, 1, 1, 1, 1, 1, 1, 0, 0, 0, 0, 0, 0, 0,
     0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11,
     0x10, 0, 2, 1, 3, 3, 2, 4, 3, 5, 5, 4, 4, 0, 0, 1, 0x7D,
@@ -79,46 +82,34 @@ constexpr unsigned kResolution = 356;     // 400/1 pixels per inch
 constexpr unsigned kPosition = 364;       // 0/1
 constexpr unsigned kNextDirectory = 306;
 
-constexpr void Put16(std::array<uint8_t, kBiLevelHeaderSize>& bytes, unsigned at, uint32_t value)
-{
-    bytes[at] = static_cast<uint8_t>(value >> 8);
-    bytes[at + 1] = static_cast<uint8_t>(value);
-}
-
-constexpr void Put32(std::array<uint8_t, kBiLevelHeaderSize>& bytes, unsigned at, uint32_t value)
-{
-    Put16(bytes, at, value >> 16);
-    Put16(bytes, at + 2, value & 0xFFFF);
-}
-
 constexpr std::array<uint8_t, kBiLevelHeaderSize> MakeBiLevelTiffTemplate()
 {
     std::array<uint8_t, kBiLevelHeaderSize> bytes {};
     bytes[0] = 'M';
     bytes[1] = 'M';
-    Put16(bytes, 2, 42);
-    Put32(bytes, 4, kFirstDirectory);
+    PutBigEndian16(bytes.data() + 2, 42);
+    PutBigEndian32(bytes.data() + 4, kFirstDirectory);
     constexpr unsigned entryCount = sizeof kBiLevelEntries / sizeof kBiLevelEntries[0];
-    Put16(bytes, kFirstDirectory, entryCount);
+    PutBigEndian16(bytes.data() + kFirstDirectory, entryCount);
     for (unsigned i = 0; i < entryCount; ++i) {
         const TiffEntry& entry = kBiLevelEntries[i];
         unsigned at = kFirstDirectory + 2 + 12 * i;
-        Put16(bytes, at, entry.tag);
-        Put16(bytes, at + 2, entry.type);
-        Put32(bytes, at + 4, entry.count);
+        PutBigEndian16(bytes.data() + at, entry.tag);
+        PutBigEndian16(bytes.data() + at + 2, entry.type);
+        PutBigEndian32(bytes.data() + at + 4, entry.count);
         if (entry.type == kShort)     // a SHORT stands in the first two bytes of the value field
-            Put16(bytes, at + 8, entry.value);
+            PutBigEndian16(bytes.data() + at + 8, entry.value);
         else
-            Put32(bytes, at + 8, entry.value);
+            PutBigEndian32(bytes.data() + at + 8, entry.value);
     }
-    Put32(bytes, kNextDirectory, 0);
+    PutBigEndian32(bytes.data() + kNextDirectory, 0);
     for (const TiffText& text : kBiLevelTexts)
         for (unsigned i = 0; text.text[i] != '\0'; ++i)
             bytes[text.offset + i] = static_cast<uint8_t>(text.text[i]);
-    Put32(bytes, kResolution, 400);
-    Put32(bytes, kResolution + 4, 1);
-    Put32(bytes, kPosition, 0);
-    Put32(bytes, kPosition + 4, 1);
+    PutBigEndian32(bytes.data() + kResolution, 400);
+    PutBigEndian32(bytes.data() + kResolution + 4, 1);
+    PutBigEndian32(bytes.data() + kPosition, 0);
+    PutBigEndian32(bytes.data() + kPosition + 4, 1);
     return bytes;
 }
 

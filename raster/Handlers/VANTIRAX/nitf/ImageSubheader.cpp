@@ -1,9 +1,9 @@
 // ReadSubheader: the image subheader of the first image segment, in the NITF
 // 2.0 and 2.1 layouts, and the mask table that leads masked image data.
+#include "base/CheckedRead.h"
 #include "base/FieldNumbers.h"
+#include "nitf/NitfFileHeader.h"
 #include "nitf/NitfImage.h"
-#include "nitf/SubheaderCursor.h"
-#include "base/ByteOrder.h"
 
 #include <cstring>
 #include <strings.h>
@@ -46,7 +46,7 @@ int32_t CompressionKindOf(const char IC[2])
 
 // Reads a length-led block of user-defined or extended data: the length
 // (5), then, when it is not 0, the overflow (3) and length - 3 bytes.
-bool ReadTaggedData(SubheaderCursor& cursor, int32_t& length, int32_t& overflow, std::vector<uint8_t>& data)
+bool ReadTaggedData(FileCursor& cursor, int32_t& length, int32_t& overflow, std::vector<uint8_t>& data)
 {
     overflow = 0;
     if (!cursor.Number(5, length) || length < 0)
@@ -61,24 +61,6 @@ bool ReadTaggedData(SubheaderCursor& cursor, int32_t& length, int32_t& overflow,
 }
 
 } // namespace
-
-bool SubheaderCursor::Number(unsigned width, int32_t& value)
-{
-    char field[16];
-    if (width >= sizeof field || !Read(field, width))
-        return false;
-    value = FieldToLong(field, width);
-    return true;
-}
-
-bool SubheaderCursor::Binary(unsigned width, uint32_t& value)
-{
-    uint8_t field[4];
-    if ((width != 2 && width != 4) || !Read(field, width))
-        return false;
-    value = width == 4 ? BigEndian32(field) : BigEndian16(field);
-    return true;
-}
 
 void CNitfImage::ClearParsed()
 {
@@ -118,7 +100,7 @@ bool CNitfImage::ReadSubheader(CFileReader& reader, uint32_t offset)
 {
     try {
         ClearParsed();
-        SubheaderCursor cursor(reader, reader.FileSize());
+        FileCursor cursor(reader, reader.FileSize());
         return ReadFront(cursor, offset) && ReadCorners(cursor) && ReadCompression(cursor) && ReadBands(cursor) &&
                ReadBlocking(cursor) && ReadExtensions(cursor) && PlaceData(cursor, offset) &&
                (!isMasked || ReadMaskTable(cursor));
@@ -127,7 +109,16 @@ bool CNitfImage::ReadSubheader(CFileReader& reader, uint32_t offset)
     }
 }
 
-bool CNitfImage::ReadFront(SubheaderCursor& cursor, uint32_t offset)
+bool CNitfImage::ReadSubheader(CFileReader& reader, const CNitfFileHeader& header)
+{
+    if (header.NUMI < 1 || header.imageSegments == nullptr)
+        return false;
+    version21 = header.version21;
+    subheaderLength = header.imageSegments[0].subheaderLength;
+    return ReadSubheader(reader, header.HL);
+}
+
+bool CNitfImage::ReadFront(FileCursor& cursor, uint32_t offset)
 {
     if (!cursor.SeekTo(offset) || !cursor.Read(subheaderText, kFrontBeforeEncryp))
         return false;
@@ -145,7 +136,7 @@ bool CNitfImage::ReadFront(SubheaderCursor& cursor, uint32_t offset)
     return true;
 }
 
-bool CNitfImage::ReadCorners(SubheaderCursor& cursor)
+bool CNitfImage::ReadCorners(FileCursor& cursor)
 {
     // In NITF 2.0 ICORDS "N" means the image has no corner locations.
     if (ICORDS() == kBlank || (ICORDS() == 'N' && !version21)) {
@@ -157,7 +148,7 @@ bool CNitfImage::ReadCorners(SubheaderCursor& cursor)
     return cursor.Read(IGEOLO.get(), kIgeoloSize);
 }
 
-bool CNitfImage::ReadCompression(SubheaderCursor& cursor)
+bool CNitfImage::ReadCompression(FileCursor& cursor)
 {
     if (!cursor.Number(1, NICOM) || NICOM < 0)
         return false;
@@ -174,7 +165,7 @@ bool CNitfImage::ReadCompression(SubheaderCursor& cursor)
     return compressionKind >= 0;
 }
 
-bool CNitfImage::ReadBands(SubheaderCursor& cursor)
+bool CNitfImage::ReadBands(FileCursor& cursor)
 {
     if (!cursor.Number(1, NBANDS))
         return false;
@@ -206,7 +197,7 @@ bool CNitfImage::ReadBands(SubheaderCursor& cursor)
     return true;
 }
 
-bool CNitfImage::ReadBlocking(SubheaderCursor& cursor)
+bool CNitfImage::ReadBlocking(FileCursor& cursor)
 {
     if (!cursor.Read(blockingText, sizeof blockingText))
         return false;
@@ -220,21 +211,21 @@ bool CNitfImage::ReadBlocking(SubheaderCursor& cursor)
     return true;
 }
 
-bool CNitfImage::ReadExtensions(SubheaderCursor& cursor)
+bool CNitfImage::ReadExtensions(FileCursor& cursor)
 {
     return ReadTaggedData(cursor, UDIDL, UDOFL, UDID) && ReadTaggedData(cursor, IXSHDL, IXSOFL, IXSHD);
 }
 
 // Image data begins LISH bytes after the subheader's start: writers may pad
 // the subheader past its last field, so the parsed end is only checked.
-bool CNitfImage::PlaceData(SubheaderCursor& cursor, uint32_t offset)
+bool CNitfImage::PlaceData(FileCursor& cursor, uint32_t offset)
 {
     if (subheaderLength == 0) {
-        dataOffset = cursor.Position();
+        dataOffset = static_cast<uint32_t>(cursor.Position());
         return true;
     }
     const uint64_t declaredEnd = uint64_t(offset) + subheaderLength;
-    if (cursor.Position() > declaredEnd || declaredEnd > uint64_t(INT32_MAX))
+    if (cursor.Position() > declaredEnd || declaredEnd > kLargestReaderOffset)
         return false;
     dataOffset = static_cast<uint32_t>(declaredEnd);
     return true;
@@ -244,14 +235,14 @@ bool CNitfImage::PlaceData(SubheaderCursor& cursor, uint32_t offset)
 // then one 4-byte block record per block (per band and block in IMODE "S",
 // where each band's blocks are stored apart). The transparent-pixel records
 // that may follow are not read.
-bool CNitfImage::ReadMaskTable(SubheaderCursor& cursor)
+bool CNitfImage::ReadMaskTable(FileCursor& cursor)
 {
     uint32_t IMDATOFF = 0, BMRLNTH = 0, TMRLNTH = 0, TPXCDLNTH = 0;
     if (!cursor.SeekTo(dataOffset) || !cursor.Binary(4, IMDATOFF) || !cursor.Binary(2, BMRLNTH) ||
         !cursor.Binary(2, TMRLNTH) || !cursor.Binary(2, TPXCDLNTH))
         return false;
     const uint64_t blockedData = uint64_t(dataOffset) + IMDATOFF;
-    if (blockedData > uint64_t(INT32_MAX))
+    if (blockedData > kLargestReaderOffset)
         return false;
     dataOffset = static_cast<uint32_t>(blockedData);
     maskTableLength = IMDATOFF;

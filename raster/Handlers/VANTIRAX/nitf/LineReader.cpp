@@ -3,6 +3,9 @@
 // rows come from the decoder's bitmaps.
 #include "nitf/NitfImage.h"
 
+#include "base/CheckedRead.h"
+#include "base/Limits.h"
+
 #include <algorithm>
 #include <cstring>
 
@@ -10,9 +13,7 @@ namespace {
 
 constexpr unsigned kByteBits = 8;
 constexpr size_t kRgbBands = 3;
-constexpr uint64_t kMaxBlockCacheBytes = uint64_t(64) << 20; // larger strips are read a row at a time
 constexpr uint32_t kStripRows = 32; // rows of a block read at once: small enough to stay in the CPU caches
-constexpr uint64_t kNoBlock = UINT64_MAX;
 
 } // namespace
 
@@ -161,8 +162,7 @@ bool CNitfImage::ReadBandSpan(CFileReader& reader, uint64_t blockStart, uint32_t
 
 void CNitfImage::ReleaseBlockCache()
 {
-    FreeVector(blockCache);
-    FreeVector(cachedBlocks);
+    blockCache.Release();
 }
 
 // The strip of rows rowInBlock belongs to, in a plane of pixelBytes-byte
@@ -187,48 +187,28 @@ const uint8_t* CNitfImage::CachedSpan(CFileReader& reader, const BlockPlace& pla
     const uint64_t slots = uint64_t(NBPR) * uint64_t(bandsTogether ? 1 : NBANDS);
     const uint64_t slotBytes = std::min<uint64_t>(kStripRows, uint64_t(NPPBV)) * uint64_t(NPPBH) *
                                uint64_t(bytesPerPixel) * uint64_t(bandsTogether ? NBANDS : 1);
-    if (place.bytes == 0 || place.bytes > slotBytes || slots * slotBytes > kMaxBlockCacheBytes ||
-        place.start > readLimit || place.bytes > readLimit - place.start || position < place.start ||
-        count > place.bytes || position - place.start > place.bytes - count || place.slot >= slots)
+    uint64_t cacheBytes = slots;
+    if (!MultiplyWithin(cacheBytes, slotBytes, kMaxBlockCacheBytes) || position < place.start ||
+        !SpanWithin(position - place.start, count, place.bytes))
         return nullptr;
-    if (blockCache.size() != slots * slotBytes) {
-        blockCache.assign(slots * slotBytes, 0);
-        cachedBlocks.assign(slots, kNoBlock);
-    }
-    uint8_t* held = blockCache.data() + place.slot * slotBytes;
-    if (cachedBlocks[place.slot] != place.start) {
-        cachedBlocks[place.slot] = kNoBlock;
-        reader.SeekTo(static_cast<int32_t>(place.start), kSeekSet);
-        if (reader.error == kSeekFailed || reader.position != place.start)
-            return nullptr;
-        reader.ReadBytes(held, static_cast<uint32_t>(place.bytes));
-        if (reader.error == kSeekFailed || reader.position - place.start != place.bytes)
-            return nullptr;
-        cachedBlocks[place.slot] = place.start;
-    }
-    return held + (position - place.start);
+    blockCache.Shape(slots, slotBytes);
+    const uint8_t* strip = blockCache.Fetch(reader, readLimit, place.slot, place.start, place.bytes);
+    return strip == nullptr ? nullptr : strip + (position - place.start);
 }
 
-// The span's bytes, from the block cache or with one seek and one read into
-// the line buffer; false when the bytes are not all in the file (a short
-// final block) or do not fit the buffer.
+// The span's bytes, from the block cache or with one read into the line
+// buffer; false when the bytes are not all in the file (a short final block)
+// or do not fit the buffer.
 bool CNitfImage::ReadSpan(CFileReader& reader, const BlockPlace& place, uint64_t position, uint64_t count,
                           const uint8_t*& data)
 {
-    if (count > lineBuffer.size() || position > readLimit || count > readLimit - position)
+    if (count > lineBuffer.size())
         return false;
     data = CachedSpan(reader, place, position, count);
     if (data != nullptr)
         return true;
     data = lineBuffer.data();
-    // Spans that follow one another in the file (the bands of a row stored
-    // by row) need no seek between them.
-    if (reader.position != position)
-        reader.SeekTo(static_cast<int32_t>(position), kSeekSet);
-    if (reader.error == kSeekFailed || reader.position != position)
-        return false;
-    reader.ReadBytes(lineBuffer.data(), static_cast<uint32_t>(count));
-    return reader.error != kSeekFailed && reader.position - position == count;
+    return CheckedRead(reader, readLimit, position, lineBuffer.data(), count);
 }
 
 // Writes byte `band` of n output pixels from source pixels sourceStride bytes

@@ -1,7 +1,7 @@
 #include "nitf/NitfFileHeader.h"
 
+#include "base/CheckedRead.h"
 #include "base/FieldNumbers.h"
-#include "base/FileReader.h"
 
 #include <cstring>
 #include <new>
@@ -9,16 +9,14 @@
 
 namespace {
 
-constexpr uint32_t kFixedLengthOffset = 342;   // FL in NITF 2.1 and NITF 2.0 without FSDEVT
-constexpr uint32_t kShiftedLengthOffset = 382; // FL in NITF 2.0 whose FSDWNG is 999998
+constexpr uint64_t kFixedLengthOffset = 342;   // FL in NITF 2.1 and NITF 2.0 without FSDEVT
+constexpr uint64_t kShiftedLengthOffset = 382; // FL in NITF 2.0 whose FSDWNG is 999998
 constexpr unsigned kVersionTextSize = 9;       // FHDR "NITF" + FVER "02.x0"
 constexpr unsigned kFileLengthWidth = 12;
 constexpr unsigned kHeaderLengthWidth = 6;
 constexpr unsigned kCountWidth = 3;
 constexpr unsigned kDataLengthWidth = 5;       // UDHDL, XHDL
 constexpr unsigned kOverflowWidth = 3;         // UDHOFL, XHDLOFL
-// Offsets are passed to 32-bit seeks; larger files are not read.
-constexpr uint64_t kLargestFile = 0x7FFFFFFF;
 // The length of the RPFHDR user-defined data: UDHOFL, tag, length and 48 bytes of header.
 constexpr int32_t kRpfUserHeaderLength = 62;
 constexpr char kRpfHeaderTag[] = "RPFHDR";
@@ -28,23 +26,12 @@ struct SegmentGroupLayout {
     unsigned dataWidth;
 };
 
-// Reads width characters and converts them; false on a short read.
-bool ReadNumber(CFileReader& reader, unsigned width, int32_t& value)
+// Reads FL (12 digits, wide enough for any file size) and HL at offset.
+// False when they are not in the file or FL is not all digits.
+bool ReadFileLengths(FileCursor& cursor, uint64_t offset, char* lengthText, uint64_t& fileLength,
+                     uint32_t& headerLength)
 {
-    char field[16] = {};
-    reader.ReadBytes(field, width);
-    if (reader.Failed())
-        return false;
-    value = FieldToLong(field, width);
-    return true;
-}
-
-// Reads FL (12 digits, wide enough for any file size) and HL at the
-// reader's position. False on a short read or an FL that is not all digits.
-bool ReadFileLengths(CFileReader& reader, char* lengthText, uint64_t& fileLength, uint32_t& headerLength)
-{
-    reader.ReadBytes(lengthText, kFileLengthWidth + kHeaderLengthWidth);
-    if (reader.Failed())
+    if (!cursor.SeekTo(offset) || !cursor.Read(lengthText, kFileLengthWidth + kHeaderLengthWidth))
         return false;
     fileLength = 0;
     for (unsigned i = 0; i < kFileLengthWidth; ++i) {
@@ -59,18 +46,17 @@ bool ReadFileLengths(CFileReader& reader, char* lengthText, uint64_t& fileLength
 }
 
 // True when the FL found at offset matches the file's size.
-bool FileLengthMatchesAt(CFileReader& reader, uint32_t offset, uint64_t fileSize, char* lengthText,
+bool FileLengthMatchesAt(FileCursor& cursor, uint64_t offset, uint64_t fileSize, char* lengthText,
                          uint32_t& headerLength)
 {
     uint64_t declaredLength = 0;
-    reader.SeekTo(static_cast<int32_t>(offset), kSeekSet);
-    return ReadFileLengths(reader, lengthText, declaredLength, headerLength) && declaredLength == fileSize;
+    return ReadFileLengths(cursor, offset, lengthText, declaredLength, headerLength) && declaredLength == fileSize;
 }
 
 // Reads one count field and its length pairs; a count of 0 leaves the list null.
-bool ReadSegmentGroup(CFileReader& reader, SegmentGroupLayout layout, int32_t& count, NitfSegmentLength*& list)
+bool ReadSegmentGroup(FileCursor& cursor, SegmentGroupLayout layout, int32_t& count, NitfSegmentLength*& list)
 {
-    if (!ReadNumber(reader, kCountWidth, count) || count < 0)
+    if (!cursor.Number(kCountWidth, count) || count < 0)
         return false;
     if (count == 0)
         return true;
@@ -78,8 +64,8 @@ bool ReadSegmentGroup(CFileReader& reader, SegmentGroupLayout layout, int32_t& c
     for (int32_t i = 0; i < count; ++i) {
         int32_t subheaderLength = 0;
         int32_t dataLength = 0;
-        if (!ReadNumber(reader, layout.subheaderWidth, subheaderLength) ||
-            !ReadNumber(reader, layout.dataWidth, dataLength) || subheaderLength < 0 || dataLength < 0)
+        if (!cursor.Number(layout.subheaderWidth, subheaderLength) ||
+            !cursor.Number(layout.dataWidth, dataLength) || subheaderLength < 0 || dataLength < 0)
             return false;
         list[i] = {static_cast<uint32_t>(subheaderLength), static_cast<uint32_t>(dataLength)};
     }
@@ -89,51 +75,43 @@ bool ReadSegmentGroup(CFileReader& reader, SegmentGroupLayout layout, int32_t& c
 // Reads UDHDL/XHDL with its overflow field and data. The length counts the
 // 3-character overflow field, so 1 and 2 cannot be right; data running past
 // the end of the file is refused before anything is allocated.
-bool ReadHeaderData(CFileReader& reader, uint64_t fileSize, int32_t& length, int32_t& overflow, uint8_t*& data)
+bool ReadHeaderData(FileCursor& cursor, int32_t& length, int32_t& overflow, uint8_t*& data)
 {
-    if (!ReadNumber(reader, kDataLengthWidth, length) || length < 0)
+    if (!cursor.Number(kDataLengthWidth, length) || length < 0)
         return false;
     if (length == 0)
         return true;
-    if (length < static_cast<int32_t>(kOverflowWidth) ||
-        static_cast<uint64_t>(reader.position) + static_cast<uint64_t>(length) > fileSize)
+    if (length < static_cast<int32_t>(kOverflowWidth) || static_cast<uint64_t>(length) > cursor.Remaining())
         return false;
-    if (!ReadNumber(reader, kOverflowWidth, overflow))
+    if (!cursor.Number(kOverflowWidth, overflow))
         return false;
     uint32_t dataLength = static_cast<uint32_t>(length) - kOverflowWidth;
     data = new uint8_t[dataLength > 0 ? dataLength : 1];
-    reader.ReadBytes(data, dataLength);
-    return !reader.Failed();
+    return cursor.Read(data, dataLength);
 }
 
 } // namespace
 
 void CNitfFileHeader::SetPath(const char* filePath)
 {
-    delete[] path;
-    path = nullptr;
-    if (filePath == nullptr)
-        return;
-    size_t length = std::strlen(filePath);
-    path = new char[length + 1];
-    std::memcpy(path, filePath, length + 1);
+    path = filePath != nullptr ? filePath : "";
 }
 
 bool CNitfFileHeader::Parse()
 {
     try {
-        if (path == nullptr)
+        if (path.empty())
             return false;
         CFileReader reader(0);
-        reader.OpenFile(path, kShareDenyWrite);
+        reader.OpenFile(path.c_str(), kShareDenyWrite);
         if (!reader.HoldsFile())
             return false;
         uint64_t fileSize = reader.FileSize();
-        if (fileSize > kLargestFile)
+        if (fileSize > kLargestReaderOffset)
             return false;
+        FileCursor cursor(reader, fileSize);
 
-        reader.ReadBytes(headerText, kVersionTextSize);
-        if (reader.Failed() || std::memcmp(headerText, "NITF02", 6) != 0)
+        if (!cursor.Read(headerText, kVersionTextSize) || std::memcmp(headerText, "NITF02", 6) != 0)
             return false;
         if (std::memcmp(headerText + 7, "10", 2) == 0)
             version21 = 1;
@@ -144,33 +122,33 @@ bool CNitfFileHeader::Parse()
 
         // FL sits at 342 unless a NITF 2.0 FSDEVT moved it to 382; a file whose
         // FL matches its size at neither place was truncated or is not NITF.
-        if (FileLengthMatchesAt(reader, kFixedLengthOffset, fileSize, lengthText, HL)) {
+        if (FileLengthMatchesAt(cursor, kFixedLengthOffset, fileSize, lengthText, HL)) {
             fixedLayout = 1;
         } else {
-            if (reader.Failed() || !FileLengthMatchesAt(reader, kShiftedLengthOffset, fileSize, lengthText, HL))
+            if (!FileLengthMatchesAt(cursor, kShiftedLengthOffset, fileSize, lengthText, HL))
                 return false;
             fixedLayout = 0;
         }
         FL = static_cast<uint32_t>(fileSize);
 
-        if (!ReadSegmentGroup(reader, {6, 10}, NUMI, imageSegments) ||
-            !ReadSegmentGroup(reader, {4, 6}, NUMS, graphicSegments) ||
-            !ReadSegmentGroup(reader, {4, 3}, NUML, labelSegments) ||
-            !ReadSegmentGroup(reader, {4, 5}, NUMT, textSegments) ||
-            !ReadSegmentGroup(reader, {4, 9}, NUMDES, desSegments) ||
-            !ReadSegmentGroup(reader, {4, 7}, NUMRES, resSegments))
+        if (!ReadSegmentGroup(cursor, {6, 10}, NUMI, imageSegments) ||
+            !ReadSegmentGroup(cursor, {4, 6}, NUMS, graphicSegments) ||
+            !ReadSegmentGroup(cursor, {4, 3}, NUML, labelSegments) ||
+            !ReadSegmentGroup(cursor, {4, 5}, NUMT, textSegments) ||
+            !ReadSegmentGroup(cursor, {4, 9}, NUMDES, desSegments) ||
+            !ReadSegmentGroup(cursor, {4, 7}, NUMRES, resSegments))
             return false;
 
-        userHeaderOffset = reader.position + kDataLengthWidth;
-        if (!ReadHeaderData(reader, fileSize, UDHDL, UDHOFL, UDHD))
+        userHeaderOffset = static_cast<uint32_t>(cursor.Position()) + kDataLengthWidth;
+        if (!ReadHeaderData(cursor, UDHDL, UDHOFL, UDHD))
             return false;
         if (UDHDL == 0)
             userHeaderOffset = kNoUserHeader;
-        if (!ReadHeaderData(reader, fileSize, XHDL, XHDLOFL, XHD))
+        if (!ReadHeaderData(cursor, XHDL, XHDLOFL, XHD))
             return false;
 
         // HL is where the first image subheader begins: not inside this header, not past the file.
-        return HL >= reader.position && HL <= fileSize;
+        return HL >= cursor.Position() && HL <= fileSize;
     } catch (...) {
         return false;
     }
@@ -194,8 +172,7 @@ void CNitfFileHeader::Release()
     graphicSegments = nullptr;
     delete[] imageSegments;
     imageSegments = nullptr;
-    delete[] path;
-    path = nullptr;
+    path.clear();
 }
 
 bool CNitfFileHeader::HasRpfHeader() const

@@ -4,6 +4,7 @@
 #pragma once
 
 #include <cstdint>
+#include <string>
 
 struct NitfSegmentLength {
     uint32_t subheaderLength; // LISH, LSSH, LLSH, LTSH, LDSH or LRESH
@@ -14,7 +15,7 @@ constexpr uint32_t kNoUserHeader = 0xFFFFFFFF;
 
 class CNitfFileHeader {
 public:
-    char* path = nullptr;               // owned; set by the caller before Parse
+    std::string path;                   // set by the caller before Parse
     char headerText[342] = {};          // only FHDR and FVER (9 characters) are read
     char lengthText[18] = {};           // FL (12) and HL (6) as last read
     int32_t NUMI = 0;
@@ -46,12 +47,12 @@ public:
     CNitfFileHeader(const CNitfFileHeader&) = delete;
     CNitfFileHeader& operator=(const CNitfFileHeader&) = delete;
 
-    // Stores a heap copy of filePath (none for null); releases an older one.
+    // Sets the path Parse reads (none for null).
     void SetPath(const char* filePath);
     // Reads the header of the file at path. False on any failure; what was
     // read before the failure stays in the record.
     bool Parse();
-    // Frees every owned buffer and nulls it.
+    // Frees every owned buffer and nulls it; forgets the path.
     void Release();
 
     // True when UDHD holds the RPFHDR extension of an RPF frame.

@@ -2,6 +2,10 @@
 // decoder for compressed images.
 #include "nitf/NitfImage.h"
 
+#include "base/CheckedMath.h"
+#include "base/CheckedRead.h"
+#include "imaging/JpegMarkers.h"
+
 #include <algorithm>
 #include <strings.h>
 
@@ -12,16 +16,6 @@ constexpr int32_t kGreyPaletteSize = 256;
 constexpr int32_t kLastPaletteIndex = 255;
 constexpr unsigned kRgbTables = 3;
 constexpr uint32_t kRgbPixelBytes = 3;
-constexpr unsigned kSmallestJpegStream = 4; // SOI and EOI markers
-
-// product *= factor, false when the product would pass limit.
-bool MultiplyWithin(uint64_t& product, uint64_t factor, uint64_t limit)
-{
-    if (factor != 0 && product > limit / factor)
-        return false;
-    product *= factor;
-    return product <= limit;
-}
 
 bool IsMonoDepth(int32_t NBPP)
 {
@@ -74,7 +68,7 @@ bool CNitfImage::PrepareData(CFileReader& reader, uint32_t dataLength)
 {
     isPrepared = 0;
     FreeVector(streamIndex);
-    readLimit = std::min<uint64_t>(reader.FileSize(), uint64_t(INT32_MAX));
+    readLimit = ReachableBytes(reader.FileSize());
     if (!ValidGeometry())
         return false;
     bool served = false;
@@ -158,7 +152,7 @@ bool CNitfImage::DataFitsFile() const
         return false;
     if (isMasked) {
         for (uint32_t blockOffset : blockOffsets)
-            if (blockOffset != kBlockNotStored && (blockOffset > available || storedBlock > available - blockOffset))
+            if (blockOffset != kBlockNotStored && !SpanWithin(blockOffset, storedBlock, available))
                 return false;
         return true;
     }
@@ -175,7 +169,7 @@ bool CNitfImage::PrepareJpegData(CFileReader& reader, uint32_t dataLength)
     if ((bits != 8 && bits != 24) || dataLength <= maskTableLength)
         return false;
     const uint64_t blocks = uint64_t(NBPR) * uint64_t(NBPC);
-    if (blocks > (readLimit - dataOffset) / kSmallestJpegStream)
+    if (blocks > (readLimit - dataOffset) / kMarkersOnlyJpegBytes)
         return false;
     storedBlockCount = static_cast<uint32_t>(blocks);
     FreeVector(decoder.streamOffsets);

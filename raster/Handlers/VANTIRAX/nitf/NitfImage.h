@@ -5,15 +5,17 @@
 // ones from the embedded decoder.
 #pragma once
 
+#include "base/FileReader.h"
+#include "base/SlotCache.h"
 #include "imaging/LeadToolLibWrapper.h"
 #include "nitf/NitfBand.h"
-#include "base/FileReader.h"
 
 #include <cstdint>
 #include <memory>
 #include <vector>
 
-class SubheaderCursor;
+class CNitfFileHeader;
+class FileCursor;
 
 template <typename T>
 void FreeVector(std::vector<T>& values)
@@ -52,9 +54,8 @@ public:
     int32_t compressionKind = kUncompressed;
     uint8_t isMasked = 0;
     std::vector<uint32_t> blockOffsets; // per block (per band and block in IMODE S), relative to dataOffset
-    uint16_t fixedLayout = 0;       // copied from the file header before parsing
-    uint16_t version21 = 0;
-    uint32_t subheaderLength = 0;   // LISH of the segment, set by the caller; 0 when not known
+    uint16_t version21 = 0;         // 1 in NITF 2.1 (from the file header), set before parsing
+    uint32_t subheaderLength = 0;   // LISH of the segment, set before parsing; 0 when not known
     CLeadToolLibWrapper decoder;
     char subheaderText[kSubheaderFrontSize] = {};
     std::unique_ptr<char[]> IGEOLO; // 60 characters and a NUL, or null without corners
@@ -72,13 +73,16 @@ public:
     std::vector<uint8_t> IXSHD;
     int32_t NCOLS = 0, NROWS = 0;
 
-    explicit CNitfImage(uint16_t initialFixedLayout = 0) : fixedLayout(initialFixedLayout) {}
+    CNitfImage() = default;
     CNitfImage(const CNitfImage&) = delete;
     CNitfImage& operator=(const CNitfImage&) = delete;
 
     // Parses the image subheader at offset. Image data is taken to start at
     // offset + subheaderLength when that is known. False on any failure.
     bool ReadSubheader(CFileReader& reader, uint32_t offset);
+    // Parses the subheader of the file's first image segment: at HL, LISH
+    // bytes long, in the header's NITF version.
+    bool ReadSubheader(CFileReader& reader, const CNitfFileHeader& header);
     void Release();
 
     // Whether the image is served; sets up the decoder for compressed kinds.
@@ -118,9 +122,8 @@ private:
     // Strips of rows of the uncompressed blocks being read, one slot per block
     // column (per band and block column in IMODE "B" and "S"), so that a strip
     // costs one file read rather than one per row. Empty when they would take
-    // more than kMaxBlockCacheBytes; cachedBlocks holds each slot's file offset.
-    std::vector<uint8_t> blockCache;
-    std::vector<uint64_t> cachedBlocks;
+    // more than kMaxBlockCacheBytes.
+    SlotCache blockCache;
 
     // Where one strip of a block (of every band, or of one band) lies.
     struct BlockPlace {
@@ -130,14 +133,14 @@ private:
     };
 
     // Subheader steps.
-    bool ReadFront(SubheaderCursor& cursor, uint32_t offset);
-    bool ReadCorners(SubheaderCursor& cursor);
-    bool ReadCompression(SubheaderCursor& cursor);
-    bool ReadBands(SubheaderCursor& cursor);
-    bool ReadBlocking(SubheaderCursor& cursor);
-    bool ReadExtensions(SubheaderCursor& cursor);
-    bool PlaceData(SubheaderCursor& cursor, uint32_t offset);
-    bool ReadMaskTable(SubheaderCursor& cursor);
+    bool ReadFront(FileCursor& cursor, uint32_t offset);
+    bool ReadCorners(FileCursor& cursor);
+    bool ReadCompression(FileCursor& cursor);
+    bool ReadBands(FileCursor& cursor);
+    bool ReadBlocking(FileCursor& cursor);
+    bool ReadExtensions(FileCursor& cursor);
+    bool PlaceData(FileCursor& cursor, uint32_t offset);
+    bool ReadMaskTable(FileCursor& cursor);
     void ClearParsed();
 
     // Data steps.

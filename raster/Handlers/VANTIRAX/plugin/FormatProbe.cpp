@@ -22,10 +22,7 @@ bool ProbeFormat(const char* path)
         CFileReader reader(0);
         reader.OpenFile(path, kShareDenyWrite);
         CNitfImage image;
-        image.fixedLayout = header.fixedLayout;
-        image.version21 = header.version21;
-        image.subheaderLength = header.imageSegments[0].subheaderLength;
-        if (!image.ReadSubheader(reader, header.HL))
+        if (!image.ReadSubheader(reader, header))
             throw kCodeSubheader;
         if (!image.PrepareData(reader, header.imageSegments[0].dataLength))
             throw kCodePrepare;

@@ -50,12 +50,9 @@ RHPalette* ImagePalette(const CNitfImage& image)
 
 int32_t CRasterHandler::NitfOpen(RHHandle* handle, CFileReader& reader, const CNitfFileHeader& header)
 {
-    const NitfSegmentLength& segment = header.imageSegments[0];
-    nitfImage.fixedLayout = header.fixedLayout;
-    nitfImage.version21 = header.version21;
-    nitfImage.subheaderLength = segment.subheaderLength;
-    if (!nitfImage.ReadSubheader(reader, header.HL))
+    if (!nitfImage.ReadSubheader(reader, header))
         throw kCodeSubheader;
+    const NitfSegmentLength& segment = header.imageSegments[0];
     // A kind this library does not serve: the open answers 1, the status 5 says it failed.
     if (!nitfImage.PrepareData(reader, segment.dataLength)) {
         lastError = static_cast<int32_t>(kCodePrepare);

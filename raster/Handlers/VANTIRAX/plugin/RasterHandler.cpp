@@ -30,30 +30,14 @@ void ReleaseHandleRecords(RHHandle* handle)
     handle->geoRef = nullptr;
 }
 
-CRasterHandler::CRasterHandler(const char* filePath)
-{
-    SetPath(filePath);
-}
+CRasterHandler::CRasterHandler(const char* filePath) : path(filePath != nullptr ? filePath : "") {}
 
 CRasterHandler::~CRasterHandler()
 {
     std::free(rowBuffer);
     rowBuffer = nullptr;
-    delete[] path;
-    path = nullptr;
     fileReader.CloseFile();
     nitfImage.Release();
-}
-
-void CRasterHandler::SetPath(const char* filePath)
-{
-    delete[] path;
-    path = nullptr;
-    if (filePath == nullptr || filePath[0] == '\0')
-        return;
-    size_t length = std::strlen(filePath);
-    path = new char[length + 1];
-    std::memcpy(path, filePath, length + 1);
 }
 
 // The header step: parse the file header and choose the branch. Any failure
@@ -61,7 +45,7 @@ void CRasterHandler::SetPath(const char* filePath)
 bool CRasterHandler::ReadHeader(CNitfFileHeader& header)
 {
     try {
-        header.SetPath(path);
+        header.SetPath(path.c_str());
         if (!header.Parse())
             throw kCodeHeaderParse;
         if (header.NUMI < 1)
@@ -84,7 +68,7 @@ void CRasterHandler::AttachTo(RHHandle* handle)
     handle->palette = nullptr;
     // The path fits: the header step refuses paths the file reader cannot hold.
     std::memset(handle->path, 0, kHandlePathSize);
-    std::strncpy(handle->path, path, kHandlePathSize - 1);
+    std::strncpy(handle->path, path.c_str(), kHandlePathSize - 1);
 }
 
 int32_t CRasterHandler::OpenImage(RHHandle* handle)
@@ -95,7 +79,7 @@ int32_t CRasterHandler::OpenImage(RHHandle* handle)
     // Its success is not tested here: a reader without a file reads nothing
     // and the branch's first read fails.
     CFileReader reader(0);
-    reader.OpenFile(path, kShareDenyWrite);
+    reader.OpenFile(path.c_str(), kShareDenyWrite);
     AttachTo(handle);
     // Failures raised by a branch pass to the export layer; the reader and
     // header are released on the way out.
@@ -119,7 +103,7 @@ void CRasterHandler::DoStartDraw(const int32_t rect[4], uint32_t* rowWidth)
     if (rowBuffer == nullptr)
         throw kCodeRowBuffer;
 
-    fileReader.OpenFile(path, kShareDenyWrite);
+    fileReader.OpenFile(path.c_str(), kShareDenyWrite);
     if (fileReader.handle == kNoFile || fileReader.error == kSeekFailed)
         throw kCodeReopen;
     if (mode == kModeRpfFrame)

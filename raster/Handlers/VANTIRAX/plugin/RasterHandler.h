@@ -10,6 +10,7 @@
 #include "rpf/RpfFrameReader.h"
 
 #include <cstdint>
+#include <string>
 
 class CNitfFileHeader;
 
@@ -28,7 +29,7 @@ constexpr int kRectEndColumn = 2; // the column just past the rightmost
 class CRasterHandler {
 public:
     uint32_t signature = kHandlerSignature;
-    char* path = nullptr;
+    std::string path;           // empty when RH_Open was given none
     uint8_t* rowBuffer = nullptr;
     size_t rowBufferBytes = 0;
     CRpfFrameReader rpfReader;
@@ -42,8 +43,6 @@ public:
     ~CRasterHandler();
     CRasterHandler(const CRasterHandler&) = delete;
     CRasterHandler& operator=(const CRasterHandler&) = delete;
-
-    void SetPath(const char* filePath);
 
     // Each operation reports 1 or 0 and sets the handle's status; failures
     // are caught here as the error model says, so none escapes.

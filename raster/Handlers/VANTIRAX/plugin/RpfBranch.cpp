@@ -7,21 +7,22 @@
 #include "plugin/GeoRefRecord.h"
 #include "plugin/Palette.h"
 #include "plugin/RasterHandler.h"
+#include "rpf/RpfValueTable.h"
 
 namespace {
 
 constexpr uint32_t kRpfFrameSize = 1536;         // columns and rows, whatever the frame's own geometry
 constexpr uint32_t kRpfHeaderDataOffset = 14;    // UDHOFL (3), extension tag (6), extension length (5)
-constexpr uint32_t kTableColors = 216;           // palette entries taken from the frame's table
-constexpr int32_t kRpfPaletteEntries = 217;      // plus white for the masked pixel value
+constexpr int32_t kRpfPaletteEntries = kMaskedPixel + 1; // the table's colours and white for the masked value
 constexpr uint8_t kWhite = 255;
 
-// Fills palette entries 0..215 from the frame's colour table, or from its grey
-// table with each grey repeated three times; entry 216 is white.
+// Fills the palette entries below the masked value from the frame's colour
+// table, or from its grey table with each grey repeated three times; the
+// masked value's entry is white.
 bool FillPalette(RpfColorGraySection& colors, uint8_t* entries)
 {
     const bool fromColors = colors.IsColorTable();
-    for (uint32_t index = 0; index < kTableColors; ++index) {
+    for (uint32_t index = 0; index < kPaletteRecords; ++index) {
         uint8_t* entry = entries + index * 3;
         if (fromColors) {
             if (!colors.GetPaletteColor(index, entry[0], entry[1], entry[2]))
@@ -32,7 +33,7 @@ bool FillPalette(RpfColorGraySection& colors, uint8_t* entries)
             entry[1] = entry[2] = entry[0];
         }
     }
-    uint8_t* masked = entries + kTableColors * 3;
+    uint8_t* masked = entries + kMaskedPixel * 3;
     masked[0] = masked[1] = masked[2] = kWhite;
     return true;
 }
@@ -41,9 +42,8 @@ bool FillPalette(RpfColorGraySection& colors, uint8_t* entries)
 
 int32_t CRasterHandler::RpfOpen(RHHandle* handle, CFileReader& reader, const CNitfFileHeader& header)
 {
-    if (header.userHeaderOffset == kNoUserHeader || header.userHeaderOffset > UINT32_MAX - kRpfHeaderDataOffset)
-        return 0;
-    if (!rpfReader.Open(reader, header.userHeaderOffset + kRpfHeaderDataOffset))
+    if (header.userHeaderOffset == kNoUserHeader ||
+        !rpfReader.Open(reader, uint64_t(header.userHeaderOffset) + kRpfHeaderDataOffset))
         return 0;
     handle->width = kRpfFrameSize;
     handle->height = kRpfFrameSize;

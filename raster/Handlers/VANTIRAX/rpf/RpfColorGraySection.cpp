@@ -4,13 +4,13 @@
 
 namespace {
 
+constexpr uint32_t kSubheaderBytes = 14;      // the two offset record counts and the external file name
+constexpr uint32_t kColormapHeaderBytes = 6;  // offset table offset and offset record length
 constexpr uint16_t kColorOffsetRecordBytes = 17;
-constexpr uint32_t kPaletteRecords = 216;
 constexpr uint8_t kColorElementLength = 3;      // red, green, blue
 constexpr uint8_t kMonochromeElementLength = 4; // red, green, blue, monochrome
 constexpr uint8_t kGreyElementLength = 1;
 constexpr uint16_t kColorValueBits = 8;
-constexpr uint32_t kWhiteAbove = 216; // indices above this are white without a table
 
 } // namespace
 
@@ -18,56 +18,47 @@ bool RpfColorGraySection::ReadColorGraySection(CFileReader& reader, uint32_t sub
                                                uint32_t colormapLocation, uint32_t /*converterLocation*/,
                                                bool bigEndian)
 {
-    if (!SeekToLocation(reader, subheaderLocation))
+    uint8_t subheader[kSubheaderBytes];
+    uint8_t colormapHeader[kColormapHeaderBytes];
+    const uint64_t fileSize = reader.FileSize();
+    if (!CheckedRead(reader, fileSize, subheaderLocation, subheader, sizeof subheader))
         return false;
-    reader.ReadBytes(&colorGrayOffsetRecordCount, 1);
-    reader.ReadBytes(&colorConverterOffsetRecordCount, 1);
-    ReadText(reader, externalFileName, 12);
-    if (reader.Failed() || !SeekToLocation(reader, colormapLocation))
+    RpfFields fields(subheader, bigEndian);
+    fields.Number(colorGrayOffsetRecordCount);
+    fields.Number(colorConverterOffsetRecordCount);
+    fields.Text(externalFileName, 12);
+    if (!CheckedRead(reader, fileSize, colormapLocation, colormapHeader, sizeof colormapHeader))
         return false;
-    ReadNumber(reader, colormapOffsetTableOffset, bigEndian);
-    ReadNumber(reader, colorGrayOffsetRecordLength, bigEndian);
-    if (reader.Failed() || colorGrayOffsetRecordLength != kColorOffsetRecordBytes)
+    RpfFields colormapFields(colormapHeader, bigEndian);
+    colormapFields.Number(colormapOffsetTableOffset);
+    colormapFields.Number(colorGrayOffsetRecordLength);
+    if (colorGrayOffsetRecordLength != kColorOffsetRecordBytes)
         return false;
     if (colorGrayOffsetRecordCount == 0)
         return true;
-    return ReadOffsetRecords(reader, colormapLocation, bigEndian) && ReadColorTables(reader, colormapLocation);
+    auto placeOf = [colormapLocation](const RpfColorOffsetRecord& record) {
+        return RpfTablePlace{record.recordCount, record.elementLength, kColorValueBits,
+                             uint64_t(colormapLocation) + record.tableOffset};
+    };
+    return ReadOffsetRecords(reader, colormapLocation, bigEndian) &&
+           ReadValueTables(reader, offsetRecords, placeOf, colorTables);
 }
 
 bool RpfColorGraySection::ReadOffsetRecords(CFileReader& reader, uint32_t colormapLocation, bool bigEndian)
 {
-    if (!SeekToLocation(reader, uint64_t(colormapLocation) + colormapOffsetTableOffset))
+    std::vector<uint8_t> records;
+    if (!ReadRecords(reader, uint64_t(colormapLocation) + colormapOffsetTableOffset, colorGrayOffsetRecordCount,
+                     kColorOffsetRecordBytes, records))
         return false;
-    offsetRecords.reserve(colorGrayOffsetRecordCount);
-    for (uint32_t index = 0; index < colorGrayOffsetRecordCount; ++index) {
-        RpfColorOffsetRecord record;
-        ReadNumber(reader, record.tableId, bigEndian);
-        ReadNumber(reader, record.recordCount, bigEndian);
-        reader.ReadBytes(&record.elementLength, 1);
-        ReadNumber(reader, record.histogramRecordLength, bigEndian);
-        ReadNumber(reader, record.tableOffset, bigEndian);
-        ReadNumber(reader, record.histogramTableOffset, bigEndian);
-        if (reader.Failed())
-            return false;
-        offsetRecords.push_back(record);
-    }
-    return true;
-}
-
-bool RpfColorGraySection::ReadColorTables(CFileReader& reader, uint32_t colormapLocation)
-{
-    uint64_t fileSize = reader.FileSize();
-    uint64_t bytesLeft = fileSize;
-    colorTables.reserve(offsetRecords.size());
-    for (const RpfColorOffsetRecord& record : offsetRecords) {
-        RpfValueTable table;
-        if (!table.SetShape(record.recordCount, record.elementLength, kColorValueBits, bytesLeft))
-            return false;
-        bytesLeft -= table.totalSize;
-        uint64_t location = uint64_t(colormapLocation) + record.tableOffset;
-        if (!FitsInFile(location, table.totalSize, fileSize) || !table.ReadTableData(reader, location))
-            return false;
-        colorTables.push_back(std::move(table));
+    RpfFields fields(records.data(), bigEndian);
+    offsetRecords.resize(colorGrayOffsetRecordCount);
+    for (RpfColorOffsetRecord& record : offsetRecords) {
+        fields.Number(record.tableId);
+        fields.Number(record.recordCount);
+        fields.Number(record.elementLength);
+        fields.Number(record.histogramRecordLength);
+        fields.Number(record.tableOffset);
+        fields.Number(record.histogramTableOffset);
     }
     return true;
 }
@@ -120,7 +111,8 @@ bool RpfColorGraySection::ReadSelectedEntry(const RpfValueTable& table, uint32_t
 
 bool RpfColorGraySection::GetPaletteColor(uint32_t index, uint8_t& red, uint8_t& green, uint8_t& blue)
 {
-    if (index > kWhiteAbove) {
+    // Indices past the masked value are white without a table.
+    if (index > kMaskedPixel) {
         red = green = blue = 255;
         return true;
     }
@@ -135,7 +127,7 @@ bool RpfColorGraySection::GetPaletteColor(uint32_t index, uint8_t& red, uint8_t&
 
 bool RpfColorGraySection::GetPaletteGray(uint32_t index, uint8_t& grey)
 {
-    if (index > kWhiteAbove) {
+    if (index > kMaskedPixel) {
         grey = 255;
         return true;
     }

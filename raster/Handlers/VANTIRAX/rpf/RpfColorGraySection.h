@@ -38,7 +38,6 @@ struct RpfColorGraySection {
 
 private:
     bool ReadOffsetRecords(CFileReader& reader, uint32_t colormapLocation, bool bigEndian);
-    bool ReadColorTables(CFileReader& reader, uint32_t colormapLocation);
     bool HasTableOf(uint32_t elementLength, bool orLonger) const;
     bool ReadSelectedEntry(const RpfValueTable& table, uint32_t index);
 };

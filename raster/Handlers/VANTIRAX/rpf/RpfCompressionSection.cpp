@@ -8,6 +8,8 @@ namespace {
 
 constexpr uint16_t kVqAlgorithm = 1;
 constexpr uint16_t kVqAlgorithmAlternate = 2; // decoded exactly as algorithm 1
+constexpr uint32_t kSubheaderBytes = 6;       // algorithm ID and the two offset record counts
+constexpr uint32_t kLookupHeaderBytes = 6;    // lookup offset table offset and record length
 constexpr uint16_t kLookupOffsetRecordBytes = 14;
 
 } // namespace
@@ -16,13 +18,13 @@ bool RpfCompressionSection::ReadCompressionSection(CFileReader& reader, uint32_t
                                                    uint32_t lookupLocation, uint32_t /*parameterLocation*/,
                                                    bool bigEndian)
 {
-    if (!SeekToLocation(reader, subheaderLocation))
+    uint8_t subheader[kSubheaderBytes];
+    if (!CheckedRead(reader, reader.FileSize(), subheaderLocation, subheader, sizeof subheader))
         return false;
-    ReadNumber(reader, algorithmId, bigEndian);
-    ReadNumber(reader, lookupOffsetRecordCount, bigEndian);
-    ReadNumber(reader, parameterOffsetRecordCount, bigEndian);
-    if (reader.Failed())
-        return false;
+    RpfFields fields(subheader, bigEndian);
+    fields.Number(algorithmId);
+    fields.Number(lookupOffsetRecordCount);
+    fields.Number(parameterOffsetRecordCount);
     if (algorithmId != kVqAlgorithm && algorithmId != kVqAlgorithmAlternate)
         return false;
     lookupSubsectionLocation = lookupLocation;
@@ -34,49 +36,31 @@ bool RpfCompressionSection::ReadCompressionSection(CFileReader& reader, uint32_t
 
 bool RpfCompressionSection::ReadLookupSubsection(CFileReader& reader, bool bigEndian)
 {
-    if (!SeekToLocation(reader, lookupSubsectionLocation))
+    uint8_t header[kLookupHeaderBytes];
+    if (!CheckedRead(reader, reader.FileSize(), lookupSubsectionLocation, header, sizeof header))
         return false;
-    ReadNumber(reader, lookupOffsetTableOffset, bigEndian);
-    ReadNumber(reader, lookupOffsetRecordLength, bigEndian);
-    if (reader.Failed() || lookupOffsetRecordLength != kLookupOffsetRecordBytes)
+    RpfFields fields(header, bigEndian);
+    fields.Number(lookupOffsetTableOffset);
+    fields.Number(lookupOffsetRecordLength);
+    std::vector<uint8_t> records;
+    if (lookupOffsetRecordLength != kLookupOffsetRecordBytes ||
+        !ReadRecords(reader, uint64_t(lookupSubsectionLocation) + lookupOffsetTableOffset, lookupOffsetRecordCount,
+                     kLookupOffsetRecordBytes, records))
         return false;
-    uint64_t tableLocation = uint64_t(lookupSubsectionLocation) + lookupOffsetTableOffset;
-    uint64_t recordBytes = uint64_t(lookupOffsetRecordCount) * kLookupOffsetRecordBytes;
-    if (!FitsInFile(tableLocation, recordBytes, reader.FileSize()) || !SeekToLocation(reader, tableLocation))
-        return false;
-    lookupOffsetRecords.reserve(lookupOffsetRecordCount);
-    for (uint32_t index = 0; index < lookupOffsetRecordCount; ++index) {
-        RpfLookupOffsetRecord record;
-        ReadNumber(reader, record.tableId, bigEndian);
-        ReadNumber(reader, record.recordCount, bigEndian);
-        ReadNumber(reader, record.valuesPerRecord, bigEndian);
-        ReadNumber(reader, record.valueBitLength, bigEndian);
-        ReadNumber(reader, record.tableOffset, bigEndian);
-        if (reader.Failed())
-            return false;
-        lookupOffsetRecords.push_back(record);
+    RpfFields recordFields(records.data(), bigEndian);
+    lookupOffsetRecords.resize(lookupOffsetRecordCount);
+    for (RpfLookupOffsetRecord& record : lookupOffsetRecords) {
+        recordFields.Number(record.tableId);
+        recordFields.Number(record.recordCount);
+        recordFields.Number(record.valuesPerRecord);
+        recordFields.Number(record.valueBitLength);
+        recordFields.Number(record.tableOffset);
     }
-    return ReadLookupTables(reader);
-}
-
-bool RpfCompressionSection::ReadLookupTables(CFileReader& reader)
-{
-    // All tables together can hold no more than the file: offset records that
-    // share one stretch of the file cannot multiply the memory it costs.
-    uint64_t fileSize = reader.FileSize();
-    uint64_t bytesLeft = fileSize;
-    lookupTables.reserve(lookupOffsetRecords.size());
-    for (const RpfLookupOffsetRecord& record : lookupOffsetRecords) {
-        RpfValueTable table;
-        if (!table.SetShape(record.recordCount, record.valuesPerRecord, record.valueBitLength, bytesLeft))
-            return false;
-        bytesLeft -= table.totalSize;
-        uint64_t location = uint64_t(lookupSubsectionLocation) + record.tableOffset;
-        if (!FitsInFile(location, table.totalSize, fileSize) || !table.ReadTableData(reader, location))
-            return false;
-        lookupTables.push_back(std::move(table));
-    }
-    return true;
+    auto placeOf = [this](const RpfLookupOffsetRecord& record) {
+        return RpfTablePlace{record.recordCount, record.valuesPerRecord, record.valueBitLength,
+                             uint64_t(lookupSubsectionLocation) + record.tableOffset};
+    };
+    return ReadValueTables(reader, lookupOffsetRecords, placeOf, lookupTables);
 }
 
 bool RpfCompressionSection::DecodeKernelRow(uint16_t kernelRow, uint16_t code, uint16_t kernelWidth,
@@ -89,9 +73,9 @@ bool RpfCompressionSection::DecodeKernelRow(uint16_t kernelRow, uint16_t code, u
         return false;
     // A record narrower than the kernel leaves the remaining columns masked.
     uint16_t valuesWritten = table.valuesPerRecord < kernelWidth ? table.valuesPerRecord : kernelWidth;
-    std::memset(output + valuesWritten, MaskedPixel, kernelWidth - valuesWritten);
-    if (code == MaskedCode) {
-        std::memset(output, MaskedPixel, valuesWritten);
+    std::memset(output + valuesWritten, kMaskedPixel, kernelWidth - valuesWritten);
+    if (code == kMaskedCode) {
+        std::memset(output, kMaskedPixel, valuesWritten);
         return true;
     }
     return table.ReadTableEntry(code, output);

@@ -37,5 +37,4 @@ struct RpfCompressionSection {
 
 private:
     bool ReadLookupSubsection(CFileReader& reader, bool bigEndian);
-    bool ReadLookupTables(CFileReader& reader);
 };

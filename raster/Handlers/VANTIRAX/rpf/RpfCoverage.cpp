@@ -20,10 +20,7 @@ bool InRange(double value, double limit)
 bool RpfCoverage::ReadCoverage(CFileReader& reader, uint32_t location, bool bigEndian)
 {
     double values[kCoverageValues];
-    if (!SeekToLocation(reader, location))
-        return false;
-    reader.ReadBytes(values, sizeof values);
-    if (reader.Failed())
+    if (!CheckedRead(reader, reader.FileSize(), location, values, sizeof values))
         return false;
     for (unsigned index = 0; index < kCoverageValues; ++index) {
         if (bigEndian)

@@ -1,48 +1,57 @@
-// Field-level reading shared by the RPF section readers: numbers in the
-// frame's byte order, NUL-terminated character fields, and seeks that are
-// checked against the file before they are made.
+// Field-level reading shared by the RPF section readers: a section's
+// fixed-size fields, or a run of its records, are read whole through
+// CheckedRead; their numbers (in the frame's byte order) and character
+// fields are then taken from memory in order.
 #pragma once
 
 #include "base/ByteOrder.h"
-#include "base/FileReader.h"
+#include "base/CheckedRead.h"
 
 #include <cstdint>
+#include <cstring>
+#include <vector>
 
 static_assert(__BYTE_ORDER__ == __ORDER_LITTLE_ENDIAN__,
               "RPF fields are byte-reversed for big-endian frames on a little-endian host");
 
-// The largest offset the file reader can seek to.
-constexpr uint64_t kMaxSeekOffset = 0x7FFFFFFF;
+class RpfFields {
+public:
+    RpfFields(const uint8_t* bytes, bool bigEndian) : next(bytes), bigEndian(bigEndian) {}
 
-// Reads one 2-, 4- or 8-byte field and brings it into host order: a frame
-// whose endian indicator is 0x00 stores every number most significant byte first.
-template <typename T>
-inline void ReadNumber(CFileReader& reader, T& value, bool bigEndian)
-{
-    reader.ReadBytes(&value, sizeof value);
-    if (bigEndian)
-        ReverseBytes(value);
-}
+    // The next 1-, 2-, 4- or 8-byte field in host order: a frame whose
+    // endian indicator is 0x00 stores every number most significant byte first.
+    template <typename T>
+    void Number(T& value)
+    {
+        std::memcpy(&value, next, sizeof value);
+        next += sizeof value;
+        if constexpr (sizeof value > 1)
+            if (bigEndian)
+                ReverseBytes(value);
+    }
 
-// Reads a character field of width bytes into text and terminates it.
-inline void ReadText(CFileReader& reader, char* text, uint32_t width)
-{
-    reader.ReadBytes(text, width);
-    text[width] = '\0';
-}
+    // The next width characters, terminated.
+    void Text(char* text, uint32_t width)
+    {
+        std::memcpy(text, next, width);
+        text[width] = '\0';
+        next += width;
+    }
 
-// True when length bytes from location lie wholly inside a file of fileSize bytes.
-inline bool FitsInFile(uint64_t location, uint64_t length, uint64_t fileSize)
-{
-    return location <= fileSize && length <= fileSize - location;
-}
+private:
+    const uint8_t* next;
+    bool bigEndian;
+};
 
-// Seeks to an absolute location; false (without seeking) when the location
-// lies past the end of the file or beyond what the reader can seek to.
-inline bool SeekToLocation(CFileReader& reader, uint64_t location)
+// Reads count records of recordBytes bytes each at location into records;
+// false, with nothing allocated, when they do not all lie in the file.
+inline bool ReadRecords(CFileReader& reader, uint64_t location, uint32_t count, uint32_t recordBytes,
+                        std::vector<uint8_t>& records)
 {
-    if (location > kMaxSeekOffset || location > reader.FileSize())
+    const uint64_t fileSize = reader.FileSize();
+    const uint64_t bytes = uint64_t(count) * recordBytes;
+    if (!Readable(location, bytes, fileSize))
         return false;
-    reader.SeekTo(static_cast<int32_t>(location), kSeekSet);
-    return !reader.Failed();
+    records.resize(bytes);
+    return CheckedRead(reader, fileSize, location, records.data(), bytes);
 }

@@ -7,7 +7,7 @@ namespace {
 constexpr uint32_t kCommonKernelWidth = 4; // CADRG and CIB kernels are 4 x 4
 }
 
-bool CRpfFrameReader::Open(CFileReader& reader, uint32_t headerSectionOffset)
+bool CRpfFrameReader::Open(CFileReader& reader, uint64_t headerSectionOffset)
 {
     if (!headerSection.ReadHeaderSection(reader, headerSectionOffset))
         return false;
@@ -113,13 +113,13 @@ bool CRpfFrameReader::AssembleFromTable(const RpfValueTable& table, uint32_t fir
 {
     const uint16_t kernelWidth = imageSection.kernelWidth;
     uint8_t* masked = kernelRowBuffer.data();
-    std::memset(masked, MaskedPixel, kernelWidth);
+    std::memset(masked, kMaskedPixel, kernelWidth);
     const uint16_t* code = codeBuffer.data();
     // Copied into the lambda: writes to output may not reload them.
     const uint8_t* records = table.data.data();
     const uint32_t recordCount = table.recordCount;
     auto kernelOf = [masked, records, recordCount, kernelWidth](uint16_t value) -> const uint8_t* {
-        if (value == MaskedCode)
+        if (value == kMaskedCode)
             return masked;
         return value < recordCount ? records + size_t(value) * kernelWidth : nullptr;
     };

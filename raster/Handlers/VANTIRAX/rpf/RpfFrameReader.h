@@ -30,7 +30,7 @@ public:
 
     // Reads the frame whose RPF header section (the RPFHDR TRE data) starts
     // at headerSectionOffset. True when every section was read and accepted.
-    bool Open(CFileReader& reader, uint32_t headerSectionOffset);
+    bool Open(CFileReader& reader, uint64_t headerSectionOffset);
     uint32_t FindComponentLocation(uint16_t componentId) const;
 
     // Sizes the code buffer for a draw of width columns, clipped to the frame's.

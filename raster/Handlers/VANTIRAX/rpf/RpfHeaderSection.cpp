@@ -4,23 +4,24 @@
 
 namespace {
 constexpr uint8_t kBigEndianIndicator = 0x00;
+constexpr uint32_t kHeaderSectionBytes = 48;
 }
 
-bool RpfHeaderSection::ReadHeaderSection(CFileReader& reader, uint32_t location)
+bool RpfHeaderSection::ReadHeaderSection(CFileReader& reader, uint64_t location)
 {
-    if (!SeekToLocation(reader, location))
+    uint8_t bytes[kHeaderSectionBytes];
+    if (!CheckedRead(reader, reader.FileSize(), location, bytes, sizeof bytes))
         return false;
-    uint8_t endianIndicator = 0xFF;
-    reader.ReadBytes(&endianIndicator, 1);
-    bigEndian = endianIndicator == kBigEndianIndicator;
-    ReadNumber(reader, headerSectionLength, bigEndian);
-    ReadText(reader, fileName, 12);
-    reader.ReadBytes(&updateIndicator, 1);
-    ReadText(reader, governingStandardNumber, 15);
-    ReadText(reader, governingStandardDate, 8);
-    reader.ReadBytes(&securityClassification, 1);
-    ReadText(reader, securityCountryCode, 2);
-    ReadText(reader, securityReleaseMarking, 2);
-    ReadNumber(reader, locationSectionLocation, bigEndian);
-    return !reader.Failed();
+    bigEndian = bytes[0] == kBigEndianIndicator;
+    RpfFields fields(bytes + 1, bigEndian);
+    fields.Number(headerSectionLength);
+    fields.Text(fileName, 12);
+    fields.Number(updateIndicator);
+    fields.Text(governingStandardNumber, 15);
+    fields.Text(governingStandardDate, 8);
+    fields.Number(securityClassification);
+    fields.Text(securityCountryCode, 2);
+    fields.Text(securityReleaseMarking, 2);
+    fields.Number(locationSectionLocation);
+    return true;
 }

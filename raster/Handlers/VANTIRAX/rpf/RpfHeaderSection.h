@@ -18,5 +18,5 @@ struct RpfHeaderSection {
     char securityReleaseMarking[3] = {};
     uint32_t locationSectionLocation = 0; // absolute file offset
 
-    bool ReadHeaderSection(CFileReader& reader, uint32_t location);
+    bool ReadHeaderSection(CFileReader& reader, uint64_t location);
 };

@@ -1,6 +1,8 @@
 #include "rpf/RpfImageSection.h"
 
+#include "base/Limits.h"
 #include "rpf/RpfFieldReader.h"
+#include "rpf/RpfValueTable.h"
 
 #include <algorithm>
 
@@ -9,9 +11,9 @@ namespace {
 constexpr uint32_t kNoMaskTable = 0xFFFFFFFF;
 constexpr uint64_t kMaskedSubframeStart = 0xFFFFFFFF;
 constexpr uint8_t kCodeBits = 12; // the only code length of CADRG and CIB frames
-constexpr uint16_t kMaskedCode = 0xFFFF;
-constexpr uint32_t kNoSubframe = 0xFFFFFFFF;
-constexpr uint64_t kMaxSubframeCacheBytes = 1 << 20; // a row of larger subframes is read a code row at a time
+constexpr uint32_t kDescriptionBytes = 6 * 2 + 4 * 4;
+constexpr uint32_t kMaskHeaderBytes = 3 * 2;
+constexpr uint32_t kDisplayParametersBytes = 2 * 4 + 1;
 
 } // namespace
 
@@ -35,39 +37,45 @@ bool RpfImageSection::ReadImageSection(CFileReader& reader, uint32_t description
 
 bool RpfImageSection::ReadDescription(CFileReader& reader, uint32_t location, bool bigEndian)
 {
-    if (!SeekToLocation(reader, location))
+    uint8_t bytes[kDescriptionBytes];
+    if (!CheckedRead(reader, fileSize, location, bytes, sizeof bytes))
         return false;
-    ReadNumber(reader, spectralGroupCount, bigEndian);
-    ReadNumber(reader, subframeTableCount, bigEndian);
-    ReadNumber(reader, spectralBandTableCount, bigEndian);
-    ReadNumber(reader, spectralBandLinesPerImageRow, bigEndian);
-    ReadNumber(reader, subframesEastWest, bigEndian);
-    ReadNumber(reader, subframesNorthSouth, bigEndian);
-    ReadNumber(reader, outputColumnsPerSubframe, bigEndian);
-    ReadNumber(reader, outputRowsPerSubframe, bigEndian);
-    ReadNumber(reader, subframeMaskTableOffset, bigEndian);
-    ReadNumber(reader, transparencyMaskTableOffset, bigEndian);
-    return !reader.Failed();
+    RpfFields fields(bytes, bigEndian);
+    fields.Number(spectralGroupCount);
+    fields.Number(subframeTableCount);
+    fields.Number(spectralBandTableCount);
+    fields.Number(spectralBandLinesPerImageRow);
+    fields.Number(subframesEastWest);
+    fields.Number(subframesNorthSouth);
+    fields.Number(outputColumnsPerSubframe);
+    fields.Number(outputRowsPerSubframe);
+    fields.Number(subframeMaskTableOffset);
+    fields.Number(transparencyMaskTableOffset);
+    return true;
 }
 
 bool RpfImageSection::ReadMaskHeader(CFileReader& reader, uint32_t location, bool bigEndian)
 {
-    if (!SeekToLocation(reader, location))
+    uint8_t bytes[kMaskHeaderBytes];
+    if (!CheckedRead(reader, fileSize, location, bytes, sizeof bytes))
         return false;
-    ReadNumber(reader, subframeSequenceRecordLength, bigEndian);
-    ReadNumber(reader, transparencySequenceRecordLength, bigEndian);
-    ReadNumber(reader, transparentOutputPixelCodeLength, bigEndian);
-    return !reader.Failed();
+    RpfFields fields(bytes, bigEndian);
+    fields.Number(subframeSequenceRecordLength);
+    fields.Number(transparencySequenceRecordLength);
+    fields.Number(transparentOutputPixelCodeLength);
+    return true;
 }
 
 bool RpfImageSection::ReadDisplayParameters(CFileReader& reader, uint32_t location, bool bigEndian)
 {
-    if (!SeekToLocation(reader, location))
+    uint8_t bytes[kDisplayParametersBytes];
+    if (!CheckedRead(reader, fileSize, location, bytes, sizeof bytes))
         return false;
-    ReadNumber(reader, imageRows, bigEndian);
-    ReadNumber(reader, imageCodesPerRow, bigEndian);
-    reader.ReadBytes(&imageCodeBitLength, 1);
-    return !reader.Failed();
+    RpfFields fields(bytes, bigEndian);
+    fields.Number(imageRows);
+    fields.Number(imageCodesPerRow);
+    fields.Number(imageCodeBitLength);
+    return true;
 }
 
 // Refuses a geometry that cannot be decoded: no code grid, a kernel of zero
@@ -101,13 +109,13 @@ bool RpfImageSection::DeriveGeometry()
 bool RpfImageSection::ReadMaskTable(CFileReader& reader, uint32_t maskLocation, uint32_t offset, bool bigEndian,
                                     std::vector<uint32_t>& table)
 {
-    uint64_t subframeCount = uint64_t(subframesEastWest) * subframesNorthSouth;
-    uint64_t location = uint64_t(maskLocation) + offset;
-    if (!FitsInFile(location, subframeCount * sizeof(uint32_t), fileSize) || !SeekToLocation(reader, location))
+    const uint64_t subframeCount = uint64_t(subframesEastWest) * subframesNorthSouth;
+    const uint64_t location = uint64_t(maskLocation) + offset;
+    const uint64_t bytes = subframeCount * sizeof(uint32_t);
+    if (!Readable(location, bytes, fileSize))
         return false;
     table.assign(subframeCount, 0);
-    reader.ReadBytes(table.data(), static_cast<uint32_t>(subframeCount * sizeof(uint32_t)));
-    if (reader.Failed())
+    if (!CheckedRead(reader, fileSize, location, table.data(), bytes))
         return false;
     if (bigEndian)
         for (uint32_t& entry : table)
@@ -126,47 +134,28 @@ bool RpfImageSection::SubframeStart(uint32_t subframe, uint64_t& start) const
 
 void RpfImageSection::ReleaseSubframeCache()
 {
-    subframeCache = std::vector<uint8_t>();
-    cachedSubframes = std::vector<uint32_t>();
+    subframeCache.Release();
 }
 
 // The bytes of a code row from the subframe cache, reading the whole subframe
 // into its slot first when the slot holds another. Null when the subframes
 // are too large to cache or this one does not lie whole in the file: the
-// caller then reads the code row alone, with its own checks.
+// caller then reads the code row alone.
 const uint8_t* RpfImageSection::CachedCodeRow(CFileReader& reader, uint32_t subframe, uint64_t start,
                                               uint32_t codeRow)
 {
-    const uint64_t cacheBytes = uint64_t(subframesEastWest) * bytesPerSubframe;
-    if (cacheBytes > kMaxSubframeCacheBytes || !FitsInFile(start, bytesPerSubframe, fileSize) ||
-        start > kMaxSeekOffset)
+    if (uint64_t(subframesEastWest) * bytesPerSubframe > kMaxSubframeCacheBytes)
         return nullptr;
-    if (subframeCache.empty()) {
-        subframeCache.assign(cacheBytes, 0);
-        cachedSubframes.assign(subframesEastWest, kNoSubframe);
-    }
-    const uint32_t slot = subframe % subframesEastWest;
-    uint8_t* held = subframeCache.data() + size_t(slot) * bytesPerSubframe;
-    if (cachedSubframes[slot] != subframe) {
-        cachedSubframes[slot] = kNoSubframe;
-        reader.SeekTo(static_cast<int32_t>(start), kSeekSet);
-        reader.ReadBytes(held, bytesPerSubframe);
-        if (reader.Failed())
-            return nullptr;
-        cachedSubframes[slot] = subframe;
-    }
-    return held + size_t(codeRow) * bytesPerCodeRow;
+    subframeCache.Shape(subframesEastWest, bytesPerSubframe);
+    const uint8_t* held = subframeCache.Fetch(reader, fileSize, subframe % subframesEastWest, start, bytesPerSubframe);
+    return held == nullptr ? nullptr : held + size_t(codeRow) * bytesPerCodeRow;
 }
 
+// Refused before the read rather than left to a short read, whose end-of-file
+// flag would stay set for the rest of the draw.
 const uint8_t* RpfImageSection::ReadCodeRowBytes(CFileReader& reader, uint64_t rowStart)
 {
-    // Checked here rather than left to a short read, whose end-of-file flag
-    // would fail every later line of the draw.
-    if (!FitsInFile(rowStart, bytesPerCodeRow, fileSize) || rowStart > kMaxSeekOffset)
-        return nullptr;
-    reader.SeekTo(static_cast<int32_t>(rowStart), kSeekSet);
-    reader.ReadBytes(rawCodeRow.data(), bytesPerCodeRow);
-    return reader.Failed() ? nullptr : rawCodeRow.data();
+    return CheckedRead(reader, fileSize, rowStart, rawCodeRow.data(), bytesPerCodeRow) ? rawCodeRow.data() : nullptr;
 }
 
 bool RpfImageSection::ReadSubframeCodes(CFileReader& reader, uint32_t subframe, uint32_t codeRow,

@@ -4,6 +4,7 @@
 #pragma once
 
 #include "base/FileReader.h"
+#include "base/SlotCache.h"
 
 #include <cstdint>
 #include <vector>
@@ -13,8 +14,7 @@ struct RpfImageSection {
     std::vector<uint16_t> unpackedCodeRow; // the same row unpacked
     // Whole subframes read during one draw, one slot per column of subframes,
     // so that the code rows of a subframe cost one file read between them.
-    std::vector<uint8_t> subframeCache;
-    std::vector<uint32_t> cachedSubframes; // the subframe each slot holds
+    SlotCache subframeCache;
 
     // Derived geometry.
     uint16_t kernelWidth = 1;

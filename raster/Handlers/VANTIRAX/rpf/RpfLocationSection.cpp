@@ -9,27 +9,25 @@ constexpr uint32_t kLocationRecordBytes = 10;
 
 bool RpfLocationSection::ReadLocationSection(CFileReader& reader, uint32_t location, bool bigEndian)
 {
-    if (!SeekToLocation(reader, location))
+    uint8_t header[kLocationHeaderBytes];
+    if (!CheckedRead(reader, reader.FileSize(), location, header, sizeof header))
         return false;
-    ReadNumber(reader, locationSectionLength, bigEndian);
-    ReadNumber(reader, componentLocationTableOffset, bigEndian);
-    ReadNumber(reader, componentLocationRecordCount, bigEndian);
-    ReadNumber(reader, componentLocationRecordLength, bigEndian);
-    ReadNumber(reader, componentAggregateLength, bigEndian);
-    if (reader.Failed())
+    RpfFields fields(header, bigEndian);
+    fields.Number(locationSectionLength);
+    fields.Number(componentLocationTableOffset);
+    fields.Number(componentLocationRecordCount);
+    fields.Number(componentLocationRecordLength);
+    fields.Number(componentAggregateLength);
+    std::vector<uint8_t> records;
+    if (!ReadRecords(reader, uint64_t(location) + kLocationHeaderBytes, componentLocationRecordCount,
+                     kLocationRecordBytes, records))
         return false;
-    uint64_t recordBytes = uint64_t(componentLocationRecordCount) * kLocationRecordBytes;
-    if (!FitsInFile(uint64_t(location) + kLocationHeaderBytes, recordBytes, reader.FileSize()))
-        return false;
-    components.reserve(componentLocationRecordCount);
-    for (uint32_t index = 0; index < componentLocationRecordCount; ++index) {
-        RpfComponentLocation record;
-        ReadNumber(reader, record.componentId, bigEndian);
-        ReadNumber(reader, record.componentLength, bigEndian);
-        ReadNumber(reader, record.componentLocation, bigEndian);
-        if (reader.Failed())
-            return false;
-        components.push_back(record);
+    RpfFields recordFields(records.data(), bigEndian);
+    components.resize(componentLocationRecordCount);
+    for (RpfComponentLocation& record : components) {
+        recordFields.Number(record.componentId);
+        recordFields.Number(record.componentLength);
+        recordFields.Number(record.componentLocation);
     }
     return true;
 }

@@ -1,6 +1,6 @@
 #include "rpf/RpfValueTable.h"
 
-#include "rpf/RpfFieldReader.h"
+#include "base/CheckedRead.h"
 
 #include <cstring>
 
@@ -8,31 +8,21 @@ namespace {
 constexpr uint16_t kByteValueBits = 8;
 }
 
-bool RpfValueTable::SetShape(uint32_t records, uint16_t values, uint16_t bitLength, uint64_t fileSize)
+bool RpfValueTable::Read(CFileReader& reader, const RpfTablePlace& place, uint64_t& bytesLeft)
 {
-    recordCount = records;
-    valuesPerRecord = values;
-    valueBitLength = bitLength;
-    recordSize = static_cast<uint32_t>((uint64_t(values) * bitLength) / 8);
-    uint64_t bytes = uint64_t(recordSize) * records;
-    if (values == 0 || bitLength == 0 || records == 0)
+    recordCount = place.records;
+    valuesPerRecord = place.values;
+    valueBitLength = place.bitLength;
+    recordSize = static_cast<uint32_t>((uint64_t(place.values) * place.bitLength) / 8);
+    uint64_t bytes = uint64_t(recordSize) * place.records;
+    if (place.values == 0 || place.bitLength == 0 || place.records == 0)
         bytes = 0;
-    // A table can hold no more bytes than the file it is read from.
-    if (bytes > fileSize)
+    if (bytes > bytesLeft)
         return false;
+    bytesLeft -= bytes;
     totalSize = static_cast<uint32_t>(bytes);
-    return true;
-}
-
-bool RpfValueTable::ReadTableData(CFileReader& reader, uint64_t location)
-{
-    if (totalSize == 0)
-        return true;
-    if (!SeekToLocation(reader, location))
-        return false;
     data.assign(totalSize, 0);
-    reader.ReadBytes(data.data(), totalSize);
-    return !reader.Failed();
+    return CheckedRead(reader, reader.FileSize(), place.location, data.data(), totalSize);
 }
 
 bool RpfValueTable::ReadTableEntry(uint32_t index, uint8_t* output) const
@@ -40,7 +30,7 @@ bool RpfValueTable::ReadTableEntry(uint32_t index, uint8_t* output) const
     if (totalSize == 0 || data.empty() || valueBitLength != kByteValueBits)
         return false;
     uint64_t first = uint64_t(index) * recordSize;
-    if (index >= recordCount || !FitsInFile(first, valuesPerRecord, totalSize))
+    if (index >= recordCount || !SpanWithin(first, valuesPerRecord, totalSize))
         return false;
     std::memcpy(output, data.data() + first, valuesPerRecord);
     return true;

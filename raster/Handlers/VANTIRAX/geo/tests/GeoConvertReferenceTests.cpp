@@ -16,30 +16,26 @@
 
 namespace {
 
-constexpr double kA = 6378137.0;
-constexpr double kB = 6356752.3142;
-constexpr double kEarthRadius = 6371000.0;         // metres per radian of difference
-constexpr double kInverseMeridianOffset = 5.0e-8;  // radians east, by design of the inverse
+constexpr double kA = 6378137.0, kB = 6356752.3142;
+constexpr double kEarthRadius = 6371000.0;        // metres per radian of difference
+constexpr double kInverseMeridianOffset = 5.0e-8; // radians east, by design of the inverse
 
 struct Row {
-    std::string kind, mgrs;
-    double latitude = 0, longitude = 0;  // degrees ("utm" rows)
+    std::string mgrs;
+    double latitude = 0, longitude = 0; // degrees ("utm" rows)
     int32_t requestedZone = 0, zone = 0;
     char hemisphere = ' ';
-    double easting = 0, northing = 0;    // "mgrs" rows: the square's south-west corner
+    double easting = 0, northing = 0; // "mgrs" rows: the square's south-west corner
 };
 
 std::vector<Row> LoadRows(const std::string& kind)
 {
-    std::ifstream file(VX_SOURCE_DIR
-                       "/raster/Handlers/VANTIRAX/geo/tests/data/geoconvert_reference.txt");
+    std::ifstream file(VX_SOURCE_DIR "/raster/Handlers/VANTIRAX/geo/tests/data/geoconvert_reference.txt");
     std::vector<Row> rows;
-    std::string line;
-    while (std::getline(file, line)) {
+    for (std::string line, rowKind; std::getline(file, line);) {
         std::istringstream fields(line);
         Row row;
-        fields >> row.kind;
-        if (row.kind != kind)
+        if (!(fields >> rowKind) || rowKind != kind)
             continue;
         if (kind == "utm")
             fields >> row.latitude >> row.longitude >> row.requestedZone;
@@ -51,11 +47,6 @@ std::vector<Row> LoadRows(const std::string& kind)
     return rows;
 }
 
-double DegreesFromCentralMeridian(double longitude, int32_t zone)
-{
-    return std::fabs(std::fmod(longitude - (6.0 * zone - 183.0) + 540.0, 360.0) - 180.0);
-}
-
 // Largest differences allowed, in metres, by distance from the central
 // meridian. Measured against the table: 0.054 mm up to 5 degrees (the
 // ellipsoid's semi-minor axis is given to 0.1 mm), then for the inverse
@@ -63,58 +54,38 @@ double DegreesFromCentralMeridian(double longitude, int32_t zone)
 // degrees; the forward direction stays under 0.25 mm throughout.
 double ToleranceAt(double degrees)
 {
-    struct Tolerance { double degrees, metres; };
-    for (const Tolerance& t : {Tolerance{6.0, 0.001}, {7.0, 0.002}, {8.0, 0.008}, {9.0, 0.020}}) {
-        if (degrees <= t.degrees)
-            return t.metres;
-    }
-    return 0.0;
+    return degrees <= 6 ? 0.001 : degrees <= 7 ? 0.002 : degrees <= 8 ? 0.008 : degrees <= 9 ? 0.020 : 0.0;
 }
 
-TEST(GeoConvertReference, GeodeticToUtm)
+TEST(GeoConvertReference, GeodeticToUtmAndBack)
 {
     const std::vector<Row> rows = LoadRows("utm");
     ASSERT_GE(rows.size(), 300u);
     for (const Row& row : rows) {
-        SCOPED_TRACE(::testing::Message() << row.latitude << " " << row.longitude << " zone "
-                                          << row.requestedZone);
+        SCOPED_TRACE(::testing::Message() << row.latitude << " " << row.longitude << " zone " << row.requestedZone);
         int32_t zone = 0;
         char hemisphere = ' ';
-        double easting = 0.0;
-        double northing = 0.0;
-        const uint32_t status = GeodeticToUtm(
-            DegreesToRadians(row.latitude), DegreesToRadians(row.longitude), kA, kB,
-            row.requestedZone, zone, hemisphere, easting, northing);
+        double easting = 0, northing = 0, latitude = 0, longitude = 0;
+        const double degrees = std::fabs(std::fmod(row.longitude - (6.0 * row.zone - 183.0) + 540.0, 360.0) - 180.0);
+        const uint32_t status = GeodeticToUtm(DegreesToRadians(row.latitude), DegreesToRadians(row.longitude), kA, kB,
+                                              row.requestedZone, zone, hemisphere, easting, northing);
         EXPECT_EQ(status & ~kUtmEastingError, 0u);
         EXPECT_EQ(zone, row.zone);
         EXPECT_EQ(hemisphere, row.hemisphere);
-        const double tolerance = ToleranceAt(DegreesFromCentralMeridian(row.longitude, zone));
-        EXPECT_NEAR(easting, row.easting, tolerance);
-        EXPECT_NEAR(northing, row.northing, tolerance);
-    }
-}
+        EXPECT_NEAR(easting, row.easting, ToleranceAt(degrees));
+        EXPECT_NEAR(northing, row.northing, ToleranceAt(degrees));
 
-TEST(GeoConvertReference, UtmToGeodetic)
-{
-    for (const Row& row : LoadRows("utm")) {
-        SCOPED_TRACE(::testing::Message() << row.zone << row.hemisphere << " " << row.easting
-                                          << " " << row.northing);
-        double latitude = 0.0;
-        double longitude = 0.0;
-        const uint32_t status = UtmToGeodetic(row.zone, row.hemisphere, row.easting,
-                                              row.northing, kA, kB, latitude, longitude);
+        const uint32_t back =
+            UtmToGeodetic(row.zone, row.hemisphere, row.easting, row.northing, kA, kB, latitude, longitude);
         if (row.easting < 100000.0 || row.easting > 900000.0) {
-            EXPECT_EQ(status, kUtmEastingError);
+            EXPECT_EQ(back, kUtmEastingError);
             continue;
         }
-        const double degrees = DegreesFromCentralMeridian(row.longitude, row.zone);
-        EXPECT_EQ(status, degrees > 9.0 ? kUtmNorthingError : 0u);
-        const double longitudeError = std::remainder(
-            longitude - kInverseMeridianOffset - DegreesToRadians(row.longitude), kTwoPi);
-        EXPECT_NEAR((latitude - DegreesToRadians(row.latitude)) * kEarthRadius, 0.0,
-                    ToleranceAt(degrees));
-        EXPECT_NEAR(longitudeError * std::cos(latitude) * kEarthRadius, 0.0,
-                    ToleranceAt(degrees));
+        EXPECT_EQ(back, degrees > 9.0 ? kUtmNorthingError : 0u);
+        const double longitudeError =
+            std::remainder(longitude - kInverseMeridianOffset - DegreesToRadians(row.longitude), kTwoPi);
+        EXPECT_NEAR((latitude - DegreesToRadians(row.latitude)) * kEarthRadius, 0.0, ToleranceAt(degrees));
+        EXPECT_NEAR(longitudeError * std::cos(latitude) * kEarthRadius, 0.0, ToleranceAt(degrees));
     }
 }
 
@@ -125,16 +96,14 @@ TEST(GeoConvertReference, MgrsToUtm)
     const std::vector<Row> rows = LoadRows("mgrs");
     ASSERT_GE(rows.size(), 300u);
     for (const Row& row : rows) {
-        SCOPED_TRACE(row.mgrs);
         int32_t zone = 0;
         char hemisphere = ' ';
-        double easting = 0.0;
-        double northing = 0.0;
-        EXPECT_EQ(MgrsToUtm(row.mgrs.c_str(), zone, hemisphere, easting, northing), 0u);
-        EXPECT_EQ(zone, row.zone);
-        EXPECT_EQ(hemisphere, row.hemisphere);
-        EXPECT_EQ(easting, row.easting);
-        EXPECT_EQ(northing, row.northing);
+        double easting = 0, northing = 0;
+        EXPECT_EQ(MgrsToUtm(row.mgrs.c_str(), zone, hemisphere, easting, northing), 0u) << row.mgrs;
+        EXPECT_EQ(zone, row.zone) << row.mgrs;
+        EXPECT_EQ(hemisphere, row.hemisphere) << row.mgrs;
+        EXPECT_EQ(easting, row.easting) << row.mgrs;
+        EXPECT_EQ(northing, row.northing) << row.mgrs;
     }
 }
 

@@ -1,3 +1,5 @@
+// IGEOLO read in each ICORDS form: corners 1, 2 and 4 (slot 3 is never read)
+// as x, y pairs, and the EPSG code of their coordinate system.
 #include "geo/ImageCorners.h"
 
 #include <gtest/gtest.h>
@@ -8,173 +10,110 @@
 
 namespace {
 
+using Corners = std::array<double, 6>; // x1, y1, x2, y2, x4, y4
 constexpr double kUnset = -999.0;
-constexpr int32_t kGeographic = 4326;
-
-// IGEOLO texts of the JITC i_3034f family, one per ICORDS form.
-constexpr const char* kGeographicIgeolo =
-    "325900N0850000E325900N0850001E325859N0850001E325859N0850000E";
-constexpr const char* kDecimalIgeolo =
-    "+32.984+085.000+32.984+085.001+32.983+085.001+32.983+085.000";
-constexpr const char* kUtmIgeolo =
-    "453131183651215453131443651215453131433651184453131173651185";
-constexpr const char* kMgrsIgeolo =
-    "45SUS131175121545SUS131435121445SUS131435118445SUS1311751184";
-
-using Corners = std::array<double, 6>;  // x1, y1, x2, y2, x3, y3
 constexpr Corners kUnwritten = {kUnset, kUnset, kUnset, kUnset, kUnset, kUnset};
 
-Corners Read(char icords, const char* igeolo, bool version21 = true)
-{
-    Corners c = kUnwritten;
-    ReadImageCorners(ImageCornerFields{icords, igeolo, version21}, c[0], c[1], c[2], c[3], c[4],
-                     c[5]);
-    return c;
-}
-
-int32_t Code(char icords, const char* igeolo, bool version21 = true)
-{
-    return ImageCornerEpsgCode(ImageCornerFields{icords, igeolo, version21}, kGeographic);
-}
-
-// Slots 1, 2 and 4 of an IGEOLO; slot 3 is filler.
-std::string Igeolo(const char* slot1, const char* slot2, const char* slot4,
-                   const char* slot3 = "XXXXXXXXXXXXXXX")
+// IGEOLO of slots 1, 2 and 4; slot 3 is filler.
+std::string Igeolo(const char* slot1, const char* slot2, const char* slot4, const char* slot3 = "XXXXXXXXXXXXXXX")
 {
     return std::string(slot1) + slot2 + slot3 + slot4;
 }
 
-TEST(ImageCorners, GeographicAndGeocentric)
+TEST(ImageCorners, EachFormGivesItsCornersAndCode)
 {
-    const Corners expected = {85.0, 32.0 + 59.0 / 60.0, 85.0 + 1.0 / 3600.0,
-                              32.0 + 59.0 / 60.0, 85.0, 32.0 + (58.0 + 59.0 / 60.0) / 60.0};
-    EXPECT_EQ(Read('G', kGeographicIgeolo), expected);
-    // "C" latitudes are geocentric: the geodetic latitudes of the same points
-    // (GeographicLib's CartConvert of these gives back 32d59'00" and 32d58'59"
-    // geocentric); longitudes stay.
-    const Corners geodetic = Read('C', kGeographicIgeolo);
-    const Corners geodeticExpected = {85.0, 33.1593159397, 85.0 + 1.0 / 3600.0, 33.1593159397, 85.0, 33.1590374062};
-    for (size_t i = 0; i < geodetic.size(); ++i)
-        EXPECT_NEAR(geodetic[i], geodeticExpected[i], 1e-9) << i;
-    for (char icords : {'G', 'C'})
-        EXPECT_EQ(Code(icords, kGeographicIgeolo), kGeographic);
-    const std::string poles = Igeolo("900000N0000000E", "900000S0000000E", "000000N0000000E");
-    EXPECT_EQ(Read('C', poles.c_str()), (Corners{0.0, 90.0, 0.0, -90.0, 0.0, 0.0}));
-    // Only upper-case S and W turn the sign.
-    const std::string west = Igeolo("351530N0203015W", "351530s0203015w", "351530S0000000E");
-    const Corners c = Read('G', west.c_str());
-    EXPECT_NEAR(c[0], -20.504166667, 1e-9);
-    EXPECT_NEAR(c[1], 35.258333333, 1e-9);
-    EXPECT_NEAR(c[2], 20.504166667, 1e-9);
-    EXPECT_NEAR(c[3], 35.258333333, 1e-9);
-    EXPECT_NEAR(c[5], -35.258333333, 1e-9);
-}
-
-// Corners within 180 degrees of the first keep their longitude; those across
-// the 180 degree meridian from it move a whole turn, in every degree form.
-TEST(ImageCorners, LongitudesKeepRunningAcross180Degrees)
-{
+    // The IGEOLO texts of the JITC i_3034f family, one per ICORDS form.
+    const std::string geographic = "325900N0850000E325900N0850001E325859N0850001E325859N0850000E";
+    const std::string utm = "453131183651215453131443651215453131433651184453131173651185";
+    const Corners utmCorners = {313118.0, 3651215.0, 313144.0, 3651215.0, 313117.0, 3651185.0};
+    const Corners degrees = {85.0, 32.0 + 59.0 / 60.0, 85.0 + 1.0 / 3600.0, 32.0 + 59.0 / 60.0,
+                             85.0, 32.0 + (58.0 + 59.0 / 60.0) / 60.0};
     struct Case {
-        char icords;
-        std::string igeolo;
-        Corners expected;
+        char ICORDS;
+        std::string IGEOLO;
+        bool version21;
+        Corners corners;
+        int32_t code;
     };
     const Case cases[] = {
-        // JITC i_3004g: 160E to 160W.
-        {'G', Igeolo("200000N1600000E", "200000N1600000W", "200000S1600000E"), {160, 20, 200, 20, 160, -20}},
-        // Running west: a turn less.
-        {'D', Igeolo("+10.000-179.500", "+10.000+179.500", "+09.000-179.500"), {-179.5, 10, -180.5, 10, -179.5, 9}},
-        // Rotated a quarter turn: the first corner is the north-east one.
-        {'D', Igeolo("+10.000+179.500", "+09.000+179.500", "+10.000-179.500"), {179.5, 10, 179.5, 9, 180.5, 10}},
-        // South up, and one just 180 degrees wide: as written.
-        {'D', Igeolo("-10.000+020.000", "-10.000+010.000", "+10.000+020.000"), {20, -10, 10, -10, 20, 10}},
-        {'D', Igeolo("+10.000-090.000", "+10.000+090.000", "+09.000-090.000"), {-90, 10, 90, 10, -90, 9}},
+        {'G', geographic, true, degrees, 4326},
+        // "C" latitudes are geocentric: the geodetic latitudes of the same points (GeographicLib's
+        // CartConvert of these gives back 32d59'00" and 32d58'59" geocentric); longitudes stay.
+        {'C', geographic, true, {85.0, 33.1593159397, 85.0 + 1.0 / 3600.0, 33.1593159397, 85.0, 33.1590374062}, 4326},
+        {'C', Igeolo("900000N0000000E", "900000S0000000E", "000000N0000000E"), true, {0, 90, 0, -90, 0, 0}, 4326},
+        // Corners across the 180 degree meridian from the first move a whole turn: JITC i_3004g (160E to
+        // 160W), running west, rotated a quarter turn; south up and one just 180 degrees wide stay.
+        {'G', Igeolo("200000N1600000E", "200000N1600000W", "200000S1600000E"), true, {160, 20, 200, 20, 160, -20}, 4326},
+        {'D', Igeolo("+10.000-179.500", "+10.000+179.500", "+09.000-179.500"), true,
+         {-179.5, 10, -180.5, 10, -179.5, 9}, 4326},
+        {'D', Igeolo("+10.000+179.500", "+09.000+179.500", "+10.000-179.500"), true,
+         {179.5, 10, 179.5, 9, 180.5, 10}, 4326},
+        {'D', Igeolo("-10.000+020.000", "-10.000+010.000", "+10.000+020.000"), true, {20, -10, 10, -10, 20, 10}, 4326},
+        {'D', Igeolo("+10.000-090.000", "+10.000+090.000", "+09.000-090.000"), true, {-90, 10, 90, 10, -90, 9}, 4326},
+        {'D', "+32.984+085.000+32.984+085.001+32.983+085.001+32.983+085.000", true,
+         {85.0, 32.984, 85.001, 32.984, 85.0, 32.983}, 4326},
+        // Non-numbers ("nan", "inf") read as no number: 0.
+        {'D', Igeolo("+12.345-123.456", "-00.500+000.250", "+nan   +inf    "), true,
+         {-123.456, 12.345, 0.25, -0.5, 0, 0}, 4326},
+        {'N', utm, true, utmCorners, 32645},
+        {'S', utm, true, utmCorners, 32745},
+        {'N', "00" + utm.substr(2), true, utmCorners, 0}, // zones outside 1-60 have no code, the metres pass
+        {'N', "61" + utm.substr(2), true, utmCorners, 0},
+        {'S', "-1" + utm.substr(2), true, utmCorners, 0},
+        {'N', "  " + utm.substr(2), true, utmCorners, 0},
+        {'N', utm, false, kUnwritten, 0}, // in NITF 2.0 "N" means no corners
+        {'U', "45SUS131175121545SUS131435121445SUS131435118445SUS1311751184", true,
+         {313117.0, 3651215.0, 313143.0, 3651214.0, 313117.0, 3651184.0}, 32645},
+        {'U', Igeolo("31MEV0000099999", "31NEA0000000000", "31NEA0000000000"), true,
+         {500000.0, 9999999.0, 500000.0, 0.0, 500000.0, 0.0}, 32731},
+        // Each corner keeps its own zone (the second is in zone 32) while the code
+        // follows the first; the fourth lies just outside band N and keeps its
+        // position; a refused reference is (0, 0), and no code when first.
+        {'U', Igeolo("31NEA1000010000", "32NKF1000010000", "31NDK0000000000"), true,
+         {510000.0, 10000.0, 210000.0, 10000.0, 400000.0, 900000.0}, 32631},
+        {'U', Igeolo("31UJQ5248211717", "31UDQ5248211717", "31IDQ5248211717"), true,
+         {0.0, 0.0, 452482.0, 5411717.0, 0.0, 0.0}, 0},
+        {'E', geographic, true, kUnwritten, 0},
+        {'g', geographic, true, kUnwritten, 0},
+        {' ', geographic, true, kUnwritten, 0},
+        {'\0', geographic, true, kUnwritten, 0},
     };
     for (const Case& c : cases) {
-        const Corners corners = Read(c.icords, c.igeolo.c_str());
-        for (size_t i = 0; i < corners.size(); ++i)
-            EXPECT_NEAR(corners[i], c.expected[i], 1e-9) << c.igeolo << " value " << i;
+        const ImageCornerFields fields{c.ICORDS, c.IGEOLO.c_str(), c.version21};
+        Corners got = kUnwritten;
+        ReadImageCorners(fields, got[0], got[1], got[2], got[3], got[4], got[5]);
+        for (size_t i = 0; i < got.size(); ++i)
+            EXPECT_NEAR(got[i], c.corners[i], 1e-9) << c.ICORDS << " " << c.IGEOLO << " value " << i;
+        EXPECT_EQ(ImageCornerEpsgCode(fields, 4326), c.code) << c.ICORDS << " " << c.IGEOLO;
     }
-}
-
-TEST(ImageCorners, DecimalDegrees)
-{
-    EXPECT_EQ(Read('D', kDecimalIgeolo), (Corners{85.0, 32.984, 85.001, 32.984, 85.0, 32.983}));
-    EXPECT_EQ(Code('D', kDecimalIgeolo), kGeographic);
-    const std::string signs = Igeolo("+12.345-123.456", "-00.500+000.250", "+nan   +inf    ");
-    // Non-numbers ("nan", "inf") read as no number: 0.
-    EXPECT_EQ(Read('D', signs.c_str()), (Corners{-123.456, 12.345, 0.25, -0.5, 0.0, 0.0}));
-}
-
-TEST(ImageCorners, UtmPassesMetresThrough)
-{
-    const Corners expected = {313118.0, 3651215.0, 313144.0, 3651215.0, 313117.0, 3651185.0};
-    EXPECT_EQ(Read('N', kUtmIgeolo), expected);
-    EXPECT_EQ(Read('S', kUtmIgeolo), expected);
-    EXPECT_EQ(Code('N', kUtmIgeolo), 32645);
-    EXPECT_EQ(Code('S', kUtmIgeolo), 32745);
-    for (const char* zone : {"00", "61", "-1", "  "}) {
-        const std::string igeolo = std::string(zone) + (kUtmIgeolo + 2);
-        EXPECT_EQ(Code('N', igeolo.c_str()), 0) << zone;
-        EXPECT_EQ(Read('S', igeolo.c_str()), expected);
-    }
-}
-
-TEST(ImageCorners, MgrsBecomesUtm)
-{
-    EXPECT_EQ(Read('U', kMgrsIgeolo),
-              (Corners{313117.0, 3651215.0, 313143.0, 3651214.0, 313117.0, 3651184.0}));
-    EXPECT_EQ(Code('U', kMgrsIgeolo), 32645);
-    const std::string south = Igeolo("31MEV0000099999", "31NEA0000000000", "31NEA0000000000");
-    EXPECT_EQ(Code('U', south.c_str()), 32731);
-
-    // Each corner keeps its own zone (the second is in zone 32) while the code
-    // follows the first; the fourth lies just outside band N and keeps its
-    // position; a refused reference is (0, 0), and no code when first.
-    const std::string mixed = Igeolo("31NEA1000010000", "32NKF1000010000", "31NDK0000000000");
-    EXPECT_EQ(Read('U', mixed.c_str()),
-              (Corners{510000.0, 10000.0, 210000.0, 10000.0, 400000.0, 900000.0}));
-    EXPECT_EQ(Code('U', mixed.c_str()), 32631);
-    const std::string refused = Igeolo("31UJQ5248211717", "31UDQ5248211717", "31IDQ5248211717");
-    EXPECT_EQ(Read('U', refused.c_str()), (Corners{0.0, 0.0, 452482.0, 5411717.0, 0.0, 0.0}));
-    EXPECT_EQ(Code('U', refused.c_str()), 0);
     // Zone 32 has no band X (Svalbard): no code, whatever the other corners.
     const std::string svalbard = Igeolo("32XNL0000000000", "33XVL0000000000", "33XVL0000000000");
-    EXPECT_EQ(Code('U', svalbard.c_str()), 0);
-}
-
-TEST(ImageCorners, ThirdSlotIsNeverRead)
-{
-    const std::string a = Igeolo("351530N1203015W", "351530N1203015W", "351530N1203015W",
-                                 "000000N0000000E");
-    const std::string b = Igeolo("351530N1203015W", "351530N1203015W", "351530N1203015W",
-                                 "999999S9999999W");
-    EXPECT_EQ(Read('G', a.c_str()), Read('G', b.c_str()));
-}
-
-TEST(ImageCorners, FormsWithoutCornersWriteNothing)
-{
-    for (char icords : {'E', 'g', ' ', '\0'}) {
-        EXPECT_EQ(Read(icords, kGeographicIgeolo), kUnwritten) << icords;
-        EXPECT_EQ(Code(icords, kGeographicIgeolo), 0) << icords;
+    EXPECT_EQ(ImageCornerEpsgCode(ImageCornerFields{'U', svalbard.c_str(), true}, 4326), 0);
+    // Only upper-case S and W turn the sign; the third slot is never read.
+    for (const char* slot3 : {"000000N0000000E", "999999S9999999W"}) {
+        const std::string signs = Igeolo("351530N0203015W", "351530s0203015w", "351530S0000000E", slot3);
+        Corners got = kUnwritten;
+        ReadImageCorners(ImageCornerFields{'G', signs.c_str(), true}, got[0], got[1], got[2], got[3], got[4], got[5]);
+        const double d = 35.0 + 15.0 / 60.0 + 30.0 / 3600.0, m = 20.0 + 30.0 / 60.0 + 15.0 / 3600.0;
+        EXPECT_EQ(got, (Corners{-m, d, m, d, 0.0, -d}));
     }
-    // In NITF 2.0, "N" means no corners.
-    EXPECT_EQ(Read('N', kUtmIgeolo, false), kUnwritten);
-    EXPECT_EQ(Code('N', kUtmIgeolo, false), 0);
-    EXPECT_EQ(Read('G', nullptr), kUnwritten);
-    EXPECT_EQ(Code('G', nullptr), 0);
 }
 
-// Exactly sized heap copies: a read past the terminator trips the address
-// sanitizer.
-TEST(ImageCorners, ShortIgeoloIsNotReadPastItsEnd)
+// Without IGEOLO nothing is written; a short one is not read past its end
+// (exactly sized heap copies: a read past the terminator trips the address sanitizer).
+TEST(ImageCorners, MissingOrShortIgeoloIsNotReadPastItsEnd)
 {
+    Corners got = kUnwritten;
+    ReadImageCorners(ImageCornerFields{'G', nullptr, true}, got[0], got[1], got[2], got[3], got[4], got[5]);
+    EXPECT_EQ(got, kUnwritten);
+    EXPECT_EQ(ImageCornerEpsgCode(ImageCornerFields{'G', nullptr, true}, 4326), 0);
     for (char icords : {'G', 'D', 'N', 'U'}) {
         const std::string text = "4531311836";
         auto igeolo = std::make_unique<char[]>(text.size() + 1);
         text.copy(igeolo.get(), text.size());
-        EXPECT_EQ(Read(icords, igeolo.get())[5], 0.0) << icords;
-        Code(icords, igeolo.get());
+        ReadImageCorners(ImageCornerFields{icords, igeolo.get(), true}, got[0], got[1], got[2], got[3], got[4], got[5]);
+        EXPECT_EQ(got[5], 0.0) << icords;
+        ImageCornerEpsgCode(ImageCornerFields{icords, igeolo.get(), true}, 4326);
     }
 }
 

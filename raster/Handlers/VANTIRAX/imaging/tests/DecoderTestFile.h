@@ -9,23 +9,15 @@
 #include <string>
 #include <vector>
 
-constexpr uint32_t kTestDataOffset = 137;   // odd, so no alignment is assumed
+constexpr uint32_t kTestDataOffset = 137; // odd, so no alignment is assumed
 
 struct DecoderTestFile {
-    TempFile file;
-    CFileReader reader;
-
-    explicit DecoderTestFile(const std::vector<uint8_t>& data, const std::vector<uint8_t>& trailer = {})
-        : file(Content(data, trailer), ".ntf")
+    explicit DecoderTestFile(const std::vector<uint8_t>& data)
+        : file(std::string(kTestDataOffset, 'x') + std::string(data.begin(), data.end()), ".ntf")
     {
         reader.OpenFile(file.c_str(), kShareDenyWrite);
     }
 
-    static std::string Content(const std::vector<uint8_t>& data, const std::vector<uint8_t>& trailer)
-    {
-        std::string bytes(kTestDataOffset, 'x');
-        bytes.append(data.begin(), data.end());
-        bytes.append(trailer.begin(), trailer.end());
-        return bytes;
-    }
+    TempFile file;
+    CFileReader reader;
 };

@@ -9,30 +9,19 @@
 
 namespace {
 
-constexpr uint32_t kRpfHeaderDataLength = 48;
-
-std::string RpfUserHeaderData(const std::string& tag = "RPFHDR")
-{
-    return Tre(tag, std::string(kRpfHeaderDataLength, '\0'));
-}
-
-// Writes a file to a temporary path and parses its header.
-class ParsedHeader {
-public:
-    explicit ParsedHeader(const std::string& bytes) : file_(bytes, ".ntf")
+// A file written to a temporary path with its header parsed.
+struct ParsedHeader {
+    explicit ParsedHeader(const std::string& bytes) : file(bytes, ".ntf")
     {
-        header.SetPath(file_.c_str());
+        header.SetPath(file.c_str());
         parsed = header.Parse();
     }
-
+    TempFile file;
     CNitfFileHeader header;
     bool parsed = false;
-
-private:
-    TempFile file_;
 };
 
-NitfFilePlan OneImage(bool version21)
+NitfFilePlan OneImage(bool version21 = true)
 {
     NitfFilePlan plan;
     plan.version21 = version21;
@@ -53,134 +42,85 @@ TEST(FieldNumbers, ConvertLikeAtolWithinWidth)
     EXPECT_DOUBLE_EQ(FieldToDouble(std::string(32, '1').c_str(), 32), 0.0);
 }
 
-TEST(NitfFileHeader, Nitf21WithEverySegmentGroup)
+// Both versions with and without a downgrade event, every segment group,
+// extended header data: the image segments are where the header says.
+TEST(NitfFileHeader, SegmentGroupsOfBothVersions)
 {
-    NitfFilePlan plan = OneImage(true);
-    plan.images.push_back({"ab", "cdef"});
-    plan.graphics.push_back({std::string(258, 'g'), "graphic"});
-    plan.texts.push_back({std::string(282, 't'), "hello"});
-    plan.dataExtensions.push_back({std::string(200, 'd'), "des"});
-    plan.reservedExtensions.push_back({std::string(200, 'r'), "res"});
-    plan.extendedHeaderData = Tre("XTRA01", "xyz");
-    ParsedHeader file(BuildNitfFile(plan));
-    ASSERT_TRUE(file.parsed);
-    const CNitfFileHeader& h = file.header;
-    EXPECT_EQ(h.version21, 1);
-    EXPECT_EQ(h.fixedLayout, 1);
-    EXPECT_EQ(h.HL, NitfHeaderLength(plan));
-    ASSERT_EQ(h.NUMI, 2);
-    EXPECT_EQ(h.imageSegments[0].subheaderLength, 300u);
-    EXPECT_EQ(h.imageSegments[0].dataLength, 1000u);
-    EXPECT_EQ(h.imageSegments[1].dataLength, 4u);
-    ASSERT_EQ(h.NUMS, 1);
-    EXPECT_EQ(h.graphicSegments[0].dataLength, 7u);
-    EXPECT_EQ(h.NUML, 0);
-    EXPECT_EQ(h.labelSegments, nullptr);
-    ASSERT_EQ(h.NUMT, 1);
-    EXPECT_EQ(h.textSegments[0].subheaderLength, 282u);
-    ASSERT_EQ(h.NUMDES, 1);
-    ASSERT_EQ(h.NUMRES, 1);
-    EXPECT_EQ(h.resSegments[0].dataLength, 3u);
-    EXPECT_EQ(h.UDHDL, 0);
-    EXPECT_EQ(h.userHeaderOffset, kNoUserHeader);
-    EXPECT_EQ(h.XHDL, 3 + 11 + 3);
-    ASSERT_NE(h.XHD, nullptr);
-    EXPECT_EQ(std::string(reinterpret_cast<char*>(h.XHD), 6), "XTRA01");
+    for (bool version21 : {true, false})
+        for (bool event : {false, true}) {
+            NitfFilePlan plan = OneImage(version21);
+            plan.downgradeEvent = event;
+            plan.images.push_back({"ab", "cdef"});
+            plan.graphics.push_back({std::string(258, 'g'), "graphic"});
+            plan.labels.push_back({std::string(320, 'l'), "label"});
+            plan.texts.push_back({std::string(282, 't'), "hello"});
+            plan.dataExtensions.push_back({std::string(200, 'd'), "des"});
+            plan.reservedExtensions.push_back({std::string(200, 'r'), "res"});
+            plan.extendedHeaderData = Tre("XTRA01", "xyz");
+            ParsedHeader file(BuildNitfFile(plan));
+            ASSERT_TRUE(file.parsed) << version21 << event;
+            const CNitfFileHeader& h = file.header;
+            EXPECT_EQ(h.version21, version21 ? 1 : 0);
+            EXPECT_EQ(h.fixedLayout, event && !version21 ? 0 : 1);
+            EXPECT_EQ(h.HL, NitfHeaderLength(plan));
+            ASSERT_EQ(h.NUMI, 2);
+            EXPECT_EQ(h.imageSegments[0].subheaderLength, 300u);
+            EXPECT_EQ(h.imageSegments[0].dataLength, 1000u);
+            EXPECT_EQ(h.imageSegments[1].subheaderLength + h.imageSegments[1].dataLength, 6u);
+            EXPECT_EQ(std::vector<int>({h.NUMS, h.NUML, h.NUMT, h.NUMDES, h.NUMRES}), std::vector<int>(5, 1));
+            EXPECT_EQ(h.UDHDL, 0);
+            EXPECT_EQ(h.userHeaderOffset, kNoUserHeader);
+            EXPECT_EQ(h.XHDL, 3 + 11 + 3);
+            ASSERT_NE(h.XHD, nullptr);
+            EXPECT_EQ(std::string(reinterpret_cast<char*>(h.XHD), 6), "XTRA01");
+        }
+    ParsedHeader none(BuildNitfFile(NitfFilePlan{})); // no segments at all still parses
+    ASSERT_TRUE(none.parsed);
+    EXPECT_EQ(none.header.NUMI, 0);
+    EXPECT_EQ(none.header.imageSegments, nullptr);
 }
 
-TEST(NitfFileHeader, Nitf20WithAndWithoutDowngradeEvent)
-{
-    NitfFilePlan plan = OneImage(false);
-    plan.labels.push_back({std::string(320, 'l'), "label"});
-    ParsedHeader plain(BuildNitfFile(plan));
-    ASSERT_TRUE(plain.parsed);
-    EXPECT_EQ(plain.header.version21, 0);
-    EXPECT_EQ(plain.header.fixedLayout, 1);
-    ASSERT_EQ(plain.header.NUML, 1);
-    EXPECT_EQ(plain.header.labelSegments[0].dataLength, 5u);
-    EXPECT_EQ(plain.header.graphicSegments, nullptr);
-
-    plan.downgradeEvent = true;
-    ParsedHeader downgraded(BuildNitfFile(plan));
-    ASSERT_TRUE(downgraded.parsed);
-    EXPECT_EQ(downgraded.header.fixedLayout, 0);
-    EXPECT_EQ(downgraded.header.HL, NitfHeaderLength(plan));
-    EXPECT_EQ(downgraded.header.NUML, 1);
-}
-
+// An RPF header is user-defined header data of exactly 62 bytes (an RPFHDR
+// extension of 48), tag in either case; userHeaderOffset + 14 is its first byte.
 TEST(NitfFileHeader, RpfHeaderRecognisedOnlyWithLength62)
 {
-    NitfFilePlan plan = OneImage(true);
-    plan.userHeaderData = RpfUserHeaderData();
-    ParsedHeader frame(BuildNitfFile(plan));
-    ASSERT_TRUE(frame.parsed);
-    EXPECT_EQ(frame.header.UDHDL, 62);
-    EXPECT_TRUE(frame.header.HasRpfHeader());
-    // userHeaderOffset + 14 is the first byte of the RPF header data.
-    std::string bytes = BuildNitfFile(plan);
-    EXPECT_EQ(bytes.substr(frame.header.userHeaderOffset, 9), "000RPFHDR");
-
-    plan.userHeaderData = RpfUserHeaderData("rpfhdr");
-    ParsedHeader lowerCase(BuildNitfFile(plan));
-    EXPECT_TRUE(lowerCase.header.HasRpfHeader());
-
-    plan.userHeaderData = Tre("RPFHDR", std::string(kRpfHeaderDataLength + 1, '\0'));
-    ParsedHeader longer(BuildNitfFile(plan));
-    ASSERT_TRUE(longer.parsed);
-    EXPECT_EQ(longer.header.UDHDL, 63);
-    EXPECT_FALSE(longer.header.HasRpfHeader());
+    NitfFilePlan plan = OneImage();
+    for (const auto& [tag, dataLength, rpf] : {std::tuple{"RPFHDR", 48, true}, {"rpfhdr", 48, true},
+                                               {"RPFHDR", 49, false}, {"RPFHDR", 47, false}}) {
+        plan.userHeaderData = Tre(tag, std::string(size_t(dataLength), '\0'));
+        const std::string bytes = BuildNitfFile(plan);
+        ParsedHeader file(bytes);
+        ASSERT_TRUE(file.parsed);
+        EXPECT_EQ(file.header.UDHDL, 14 + dataLength);
+        EXPECT_EQ(file.header.HasRpfHeader(), rpf) << tag << dataLength;
+        EXPECT_EQ(bytes.substr(file.header.userHeaderOffset, 9), "000" + std::string(tag));
+    }
 }
 
-TEST(NitfFileHeader, RefusesWrongVersionsAndLengths)
+TEST(NitfFileHeader, RefusesWrongVersionsAndLengthsThatLie)
 {
-    std::string good = BuildNitfFile(OneImage(true));
-    for (const char* version : {"NITF02.01", "NITF01.10", "NSIF01.00", "NITF03.00"}) {
-        std::string bytes = good;
-        bytes.replace(0, 9, version);
-        EXPECT_FALSE(ParsedHeader(bytes).parsed) << version;
-    }
-    // A file truncated after writing: FL larger than the file.
-    EXPECT_FALSE(ParsedHeader(good.substr(0, good.size() - 1)).parsed);
-    // A file with bytes appended: FL smaller than the file.
-    EXPECT_FALSE(ParsedHeader(good + "x").parsed);
+    const std::string good = BuildNitfFile(OneImage());
+    for (const char* version : {"NITF02.01", "NITF01.10", "NSIF01.00", "NITF03.00"})
+        EXPECT_FALSE(ParsedHeader(std::string(version) + good.substr(9)).parsed) << version;
+    EXPECT_FALSE(ParsedHeader(good.substr(0, good.size() - 1)).parsed); // FL larger than the file
+    EXPECT_FALSE(ParsedHeader(good + "x").parsed);                       // FL smaller than the file
     EXPECT_FALSE(ParsedHeader("").parsed);
     EXPECT_FALSE(ParsedHeader("NITF02.10").parsed);
-}
-
-TEST(NitfFileHeader, RefusesLengthsThatLie)
-{
-    NitfFilePlan plan = OneImage(true);
-    plan.userHeaderData = Tre("ABCDEF", "x");
-    // UDHDL of 1 or 2 would give a negative data size.
-    for (int64_t lie : {1, 2}) {
-        plan.declaredUserHeaderLength = lie;
-        EXPECT_FALSE(ParsedHeader(BuildNitfFile(plan)).parsed) << lie;
+    // A segment count running past the end of the file whose FL still matches, or not a number.
+    for (const char* count : {"999", "-1x"})
+        EXPECT_FALSE(ParsedHeader(good.substr(0, 360) + count + good.substr(363)).parsed) << count;
+    // UDHDL of 1 or 2 (a negative data size) or past the end of the file; XHDL 2.
+    struct Lie {
+        int64_t userHeader, extendedHeader;
+    };
+    for (const Lie& lie : {Lie{1, -1}, {2, -1}, {99999, -1}, {-1, 2}}) {
+        NitfFilePlan plan = OneImage();
+        plan.userHeaderData = Tre("ABCDEF", "x");
+        plan.extendedHeaderData = lie.extendedHeader < 0 ? "" : "x";
+        plan.declaredUserHeaderLength = lie.userHeader;
+        plan.declaredExtendedHeaderLength = lie.extendedHeader;
+        EXPECT_FALSE(ParsedHeader(BuildNitfFile(plan)).parsed) << lie.userHeader << " " << lie.extendedHeader;
     }
-    // UDHDL running past the end of the file.
-    plan.declaredUserHeaderLength = 99999;
-    EXPECT_FALSE(ParsedHeader(BuildNitfFile(plan)).parsed);
-    plan.declaredUserHeaderLength = -1;
-    plan.extendedHeaderData = "x";
-    plan.declaredExtendedHeaderLength = 2;
-    EXPECT_FALSE(ParsedHeader(BuildNitfFile(plan)).parsed);
-
-    // A segment count running past the end of the file whose FL still matches.
-    std::string bytes = BuildNitfFile(OneImage(true));
-    bytes.replace(360, 3, "999");
-    EXPECT_FALSE(ParsedHeader(bytes).parsed);
-    // A non-numeric count.
-    bytes = BuildNitfFile(OneImage(true));
-    bytes.replace(360, 3, "-1x");
-    EXPECT_FALSE(ParsedHeader(bytes).parsed);
-}
-
-TEST(NitfFileHeader, NoImageSegmentsStillParses)
-{
-    NitfFilePlan plan;
-    ParsedHeader file(BuildNitfFile(plan));
-    ASSERT_TRUE(file.parsed);
-    EXPECT_EQ(file.header.NUMI, 0);
-    EXPECT_EQ(file.header.imageSegments, nullptr);
 }
 
 } // namespace

@@ -7,225 +7,165 @@
 #include <cmath>
 #include <cstring>
 #include <functional>
-#include <limits>
 
 namespace {
 
-// Record positions inside the sections the writer lays out.
-constexpr uint32_t kLocationRecords = 14;
-constexpr uint32_t kCoverageRecordIndex = 2; // 128, 129, 130, ...
-constexpr uint32_t kLookupRecords = 6;
-constexpr uint32_t kColorRecords = 6;
+using L = RpfFrameLayout;
 
-uint32_t LookupRecord(const RpfFrame& frame, uint32_t table)
-{
-    return frame.layout.lookupSubsection + kLookupRecords + table * 14;
-}
+// A number written over the frame at an offset from one of its parts.
+struct Edit {
+    uint32_t L::*part;
+    uint32_t at;
+    uint64_t value;
+    unsigned width;
+};
 
-std::unique_ptr<OpenedFrame> OpenPatched(RpfFrame frame, const std::function<void(RpfFrame&)>& patch)
-{
-    patch(frame);
-    return OpenFrame(frame);
-}
-
-bool Opens(const RpfFrame& frame, const std::function<void(RpfFrame&)>& patch)
-{
-    return OpenPatched(frame, patch)->opened;
-}
-
-bool LineDecodes(OpenedFrame& opened, uint32_t row, uint32_t first = 0, uint32_t last = kRpfFrameSide - 1)
-{
-    std::vector<uint8_t> line(kRpfFrameSide);
-    opened.reader.PrepareDraw(kRpfFrameSide);
-    return opened.reader.ReadLine(opened.drawReader, row, first, last, line.data());
-}
-
-void PatchDouble(RpfFrame& frame, uint32_t offset, double value)
+uint64_t Bits(double value)
 {
     uint64_t bits = 0;
     std::memcpy(&bits, &value, sizeof bits);
-    PatchRpfNumber(frame, offset, bits, 8);
+    return bits;
 }
 
-class RpfBadInput : public ::testing::Test {
-protected:
-    static void SetUpTestSuite() { frame_ = new RpfFrame(BuildTestFrame(RpfProduct::Cadrg, true, {3})); }
-    static void TearDownTestSuite() { delete frame_; }
-    static RpfFrame* frame_;
-};
-RpfFrame* RpfBadInput::frame_ = nullptr;
+constexpr uint32_t kCoverageRecord = 14 + 2 * 10; // the third location record: 128, 129, 130
+
+// A field of the lookup offset record of a table (after the 6-byte subsection header).
+constexpr uint32_t Lookup(uint32_t table, uint32_t field)
+{
+    return 6 + table * 14 + field;
+}
+
+TEST(RpfBadInput, RefusedAtOpenOrOnlyTheLinesTheDamageMeets)
+{
+    RpfFramePlan plan; // CADRG, big-endian, subframe 3 masked
+    plan.maskedSubframes = {3};
+    const RpfFrame frame = BuildRpfFrame(plan);
+    const std::vector<uint8_t> expected = ExpectedRpfPixels(plan);
+    const uint32_t fileSize = uint32_t(frame.bytes.size());
+    struct Line {
+        uint32_t row, first, last;
+        bool decodes; // as the undamaged frame
+    };
+    struct Case {
+        const char* what;
+        std::vector<Edit> edits;
+        bool opens;
+        std::vector<Line> lines = {};
+        std::function<void(OpenedFrame&)> alsoCheck = nullptr;
+    };
+    const Case cases[] = {
+        // Spans inside one code, across code and subframe boundaries, one column, whole rows,
+        // into and inside masked subframe 3.
+        {"undamaged", {}, true, {{5, 1, 10, true}, {6, 2, 2, true}, {7, 3, 4, true}, {8, 0, 3, true},
+          {255, 250, 262, true}, {256, 255, 256, true}, {1535, 0, 1535, true}, {1000, 1535, 1535, true},
+          {77, 511, 1029, true}, {9, 600, 1100, true}, {3, 780, 790, true}}},
+        {"0 image rows", {{&L::displayParameters, 0, 0, 4}}, false},
+        {"0 codes per row", {{&L::displayParameters, 4, 0, 4}}, false},
+        {"2^30 codes per row", {{&L::displayParameters, 4, 0x40000000, 4}}, false},
+        {"kernel width 0", {{&L::imageDescription, 12, 2, 4}}, false},
+        {"kernel height 0", {{&L::imageDescription, 16, 3, 4}}, false},
+        {"part kernels", {{&L::imageDescription, 12, 258, 4}}, false},
+        {"mask table of 65535 x 65535",
+         {{&L::imageDescription, 8, 0xFFFF, 2}, {&L::imageDescription, 10, 0xFFFF, 2}}, false},
+        {"location section past the file", {{&L::headerSection, 44, fileSize + 8, 4}}, false},
+        {"coverage past the file", {{&L::locationSection, kCoverageRecord + 6, fileSize - 50, 4}}, false},
+        {"coverage at 0xFFFFFFF0", {{&L::locationSection, kCoverageRecord + 6, 0xFFFFFFF0, 4}}, false},
+        {"65535 location records", {{&L::locationSection, 6, 0xFFFF, 2}}, false},
+        // No records: the coverage is read from offset 0, where "NITF" is no latitude.
+        {"no location records", {{&L::locationSection, 6, 0, 2}}, false},
+        {"2^28 lookup records", {{&L::lookupSubsection, Lookup(0, 2), 0x10000000, 4}}, false},
+        {"65535 lookup offset records", {{&L::compressionSubheader, 2, 0xFFFF, 2}}, false},
+        {"4 lookup records sharing a table of 60000",
+         {{&L::lookupSubsection, Lookup(0, 2), 60000, 4}, {&L::lookupSubsection, Lookup(0, 10), 62, 4},
+          {&L::lookupSubsection, Lookup(1, 2), 60000, 4}, {&L::lookupSubsection, Lookup(1, 10), 62, 4},
+          {&L::lookupSubsection, Lookup(2, 2), 60000, 4}, {&L::lookupSubsection, Lookup(2, 10), 62, 4},
+          {&L::lookupSubsection, Lookup(3, 2), 60000, 4}, {&L::lookupSubsection, Lookup(3, 10), 62, 4}},
+         false},
+        {"2^31 colour records", {{&L::colormapSubsection, 6 + 2, 0x7FFFFFFF, 4}}, false},
+        {"compression algorithm 0", {{&L::compressionSubheader, 0, 0, 2}}, false},
+        {"compression algorithm 3", {{&L::compressionSubheader, 0, 3, 2}}, false},
+        {"compression parameter records", {{&L::compressionSubheader, 4, 1, 2}}, false},
+        {"lookup record length 13", {{&L::lookupSubsection, 4, 13, 2}}, false},
+        {"colour record length 16", {{&L::colormapSubsection, 4, 16, 2}}, false},
+        {"latitude 90", {{&L::coverage, 0, Bits(90.0), 8}}, true},
+        {"longitude -180", {{&L::coverage, 8, Bits(-180.0), 8}}, true},
+        {"latitude 90.000001", {{&L::coverage, 0, Bits(90.000001), 8}}, false},
+        {"longitude NaN", {{&L::coverage, 56, Bits(std::nan("")), 8}}, false},
+        {"a resolution is no corner", {{&L::coverage, 64, Bits(1e9), 8}}, true},
+        {"11-bit codes", {{&L::displayParameters, 8, 11, 1}}, true, {{0, 0, 1535, false}, {0, 260, 270, false}}},
+        {"16-bit codes", {{&L::displayParameters, 8, 16, 1}}, true, {{0, 0, 1535, false}, {0, 260, 270, false}}},
+        {"0-bit codes", {{&L::displayParameters, 8, 0, 1}}, true, {{0, 0, 1535, false}, {0, 260, 270, false}}},
+        // Lookup records of 2 values decode (the rest of the kernel row masked, see below); of 8
+        // values, or of 16-bit values, no line of their kernel row.
+        {"2 values a record", {{&L::lookupSubsection, Lookup(1, 6), 2, 2}}, true, {{6, 0, 1535, true}},
+         [](OpenedFrame& opened) { // columns 2 and 3 of each code on rows 4k + 1 show the masked pixel
+             const std::vector<uint8_t> row = opened.Line(5);
+             for (uint32_t column = 2; column < 256 && !row.empty(); column += 4)
+                 ASSERT_EQ(row[column] + row[column + 1], 2 * kRpfMaskedPixel) << column;
+         }},
+        {"8 values a record", {{&L::lookupSubsection, Lookup(2, 6), 8, 2}}, true,
+         {{6, 0, 1535, false}, {7, 0, 1535, true}}},
+        {"16-bit values", {{&L::lookupSubsection, Lookup(3, 8), 16, 2}}, true,
+         {{3, 0, 1535, false}, {4, 0, 1535, true}}},
+        // 4-bit values: a masked code fills only the kernel (subframe 3), not the wider record.
+        {"4-bit values", {{&L::lookupSubsection, Lookup(0, 6), 8, 2}, {&L::lookupSubsection, Lookup(0, 8), 4, 2}}, true,
+         {{0, 768, 1000, true}, {0, 0, 10, false}}},
+        {"subframe 4 outside the file", {{&L::maskSubsection, 6 + 4 * 4, 0x7FFFFF00, 4}}, true,
+         {{10, 0, 1535, false}, {10, 0, 1023, true}, {11, 1024, 1100, false}, {300, 0, 1535, true}}},
+        {"no lookup offset records", {{&L::compressionSubheader, 2, 0, 2}}, true, {{0, 0, 1535, false}}},
+        {"the second compression algorithm", {{&L::compressionSubheader, 0, 2, 2}}, true,
+         {{0, 0, 1535, true}, {801, 3, 1535, true}, {1535, 0, 1535, true}}},
+        {"no colour tables", {{&L::colorGraySubheader, 0, 0, 1}}, true, {{0, 0, 1535, true}},
+         [](OpenedFrame& opened) {
+             uint8_t grey = 0;
+             RpfColorGraySection& colors = opened.reader.colorGraySection;
+             EXPECT_FALSE(colors.IsColorTable() || colors.IsGrayTable() || colors.GetPaletteGray(0, grey));
+         }},
+    };
+    for (const Case& c : cases) {
+        RpfFrame damaged = frame;
+        for (const Edit& edit : c.edits)
+            PatchRpfNumber(damaged, damaged.layout.*edit.part + edit.at, edit.value, edit.width);
+        OpenedFrame opened(damaged);
+        ASSERT_EQ(opened.opened, c.opens) << c.what;
+        for (const Line& line : c.lines) {
+            const auto from = expected.begin() + line.row * kRpfFrameSide;
+            const std::vector<uint8_t> undamaged(from + line.first, from + line.last + 1);
+            EXPECT_EQ(opened.Line(line.row, line.first, line.last), line.decodes ? undamaged : std::vector<uint8_t>())
+                << c.what << ": row " << line.row << " columns " << line.first << ".." << line.last;
+        }
+        if (c.alsoCheck)
+            c.alsoCheck(opened);
+    }
+    EXPECT_FALSE(OpenedFrame(frame.bytes, fileSize + 100).opened);
+    // Cut short: before the spatial data the frame is refused; in it, the lines past the cut fail.
+    const RpfFrameLayout& at = frame.layout;
+    for (uint32_t cut : {at.headerSection + 20, at.locationSection + 30, at.coverage + 50, at.colormapSubsection + 200,
+                         at.lookupSubsection + 40000})
+        EXPECT_FALSE(OpenedFrame(frame.bytes.substr(0, cut), at.headerSection).opened) << cut;
+    OpenedFrame cut(frame.bytes.substr(0, at.spatialData + 2 * kRpfSubframeBytes + 500), at.headerSection);
+    ASSERT_TRUE(cut.opened);
+    for (const auto& [row, first, last, decodes] :
+         {std::tuple{0u, 0u, 767u, true}, {30u, 0u, 767u, false}, {0u, 0u, 1535u, false}, {1u, 0u, 511u, true}})
+        EXPECT_EQ(cut.Line(row, first, last).empty(), !decodes) << row << " " << first << ".." << last;
+    // A little-endian frame is held to the same ranges.
+    RpfFramePlan littlePlan;
+    littlePlan.product = RpfProduct::Cib;
+    littlePlan.bigEndian = false;
+    RpfFrame little = BuildRpfFrame(littlePlan);
+    EXPECT_TRUE(OpenedFrame(little).opened);
+    PatchRpfNumber(little, little.layout.coverage + 40, Bits(200.0), 8);
+    EXPECT_FALSE(OpenedFrame(little).opened);
+    // A component listed twice: the first record in file order counts.
+    RpfFrame twice = frame;
+    const uint32_t record = frame.layout.locationSection + kCoverageRecord;
+    PatchRpfNumber(twice, record - 10, kCoverageSectionSubheader, 2);
+    PatchRpfNumber(twice, record - 4, frame.layout.coverage, 4);
+    PatchRpfNumber(twice, record + 6, 0, 4);
+    OpenedFrame first(twice);
+    ASSERT_TRUE(first.opened);
+    EXPECT_EQ(first.reader.FindComponentLocation(kCoverageSectionSubheader), frame.layout.coverage);
+    EXPECT_EQ(first.reader.FindComponentLocation(kColorConverterSubsection), 0u);
+}
 
 } // namespace
-
-TEST_F(RpfBadInput, GeometryWithoutADecodableKernelIsRefusedAtOpen)
-{
-    const RpfFrame& frame = *frame_;
-    const uint32_t display = frame.layout.displayParameters, description = frame.layout.imageDescription;
-    EXPECT_TRUE(Opens(frame, [](RpfFrame&) {}));
-    EXPECT_FALSE(Opens(frame, [&](RpfFrame& f) { PatchRpfNumber(f, display, 0, 4); }));       // 0 image rows
-    EXPECT_FALSE(Opens(frame, [&](RpfFrame& f) { PatchRpfNumber(f, display + 4, 0, 4); }));   // 0 codes per row
-    EXPECT_FALSE(Opens(frame, [&](RpfFrame& f) { PatchRpfNumber(f, description + 12, 2, 4); })); // kernel width 0
-    EXPECT_FALSE(Opens(frame, [&](RpfFrame& f) { PatchRpfNumber(f, description + 16, 3, 4); })); // kernel height 0
-    EXPECT_FALSE(Opens(frame, [&](RpfFrame& f) { PatchRpfNumber(f, description + 12, 258, 4); })); // part kernels
-}
-
-TEST_F(RpfBadInput, CodeBitLengthOtherThanTwelveOpensButEveryLineFails)
-{
-    for (uint8_t bits : {11, 16, 0}) {
-        auto opened = OpenPatched(*frame_, [&](RpfFrame& f) { f.bytes[f.layout.displayParameters + 8] = char(bits); });
-        ASSERT_TRUE(opened->opened) << int(bits);
-        EXPECT_FALSE(LineDecodes(*opened, 0)) << int(bits);
-        EXPECT_FALSE(LineDecodes(*opened, 0, 260, 270)) << "masked subframe, " << int(bits);
-    }
-}
-
-TEST_F(RpfBadInput, LookupRecordsNarrowerOrWiderThanTheKernel)
-{
-    std::vector<uint8_t> expected = ExpectedRpfPixels(RpfFramePlan{});
-    // Table 1 with 2 values per record: columns 2 and 3 of each code on rows 4k+1 show the masked pixel.
-    auto narrow = OpenPatched(*frame_, [](RpfFrame& f) { PatchRpfNumber(f, LookupRecord(f, 1) + 6, 2, 2); });
-    ASSERT_TRUE(narrow->opened);
-    std::vector<uint8_t> line(kRpfFrameSide);
-    narrow->reader.PrepareDraw(kRpfFrameSide);
-    ASSERT_TRUE(narrow->reader.ReadLine(narrow->drawReader, 5, 0, kRpfFrameSide - 1, line.data()));
-    for (uint32_t column = 2; column < 256; column += 4)
-        ASSERT_EQ(line[column], kRpfMaskedPixel) << column;
-    ASSERT_TRUE(narrow->reader.ReadLine(narrow->drawReader, 6, 0, kRpfFrameSide - 1, line.data()));
-    EXPECT_TRUE(std::equal(line.begin(), line.begin() + 768, expected.begin() + 6 * kRpfFrameSide));
-
-    // Records of 8 values, or of 16-bit values, decode no line of their kernel row.
-    auto wide = OpenPatched(*frame_, [](RpfFrame& f) { PatchRpfNumber(f, LookupRecord(f, 2) + 6, 8, 2); });
-    ASSERT_TRUE(wide->opened);
-    EXPECT_FALSE(LineDecodes(*wide, 6));
-    EXPECT_TRUE(LineDecodes(*wide, 7));
-    auto sixteen = OpenPatched(*frame_, [](RpfFrame& f) { PatchRpfNumber(f, LookupRecord(f, 3) + 8, 16, 2); });
-    ASSERT_TRUE(sixteen->opened);
-    EXPECT_FALSE(LineDecodes(*sixteen, 3));
-    // A table of 4-bit values: a masked code fills only the kernel, not the wider record.
-    auto nibbles = OpenPatched(*frame_, [](RpfFrame& f) {
-        PatchRpfNumber(f, LookupRecord(f, 0) + 6, 8, 2);
-        PatchRpfNumber(f, LookupRecord(f, 0) + 8, 4, 2);
-    });
-    ASSERT_TRUE(nibbles->opened);
-    EXPECT_TRUE(LineDecodes(*nibbles, 0, 768, 1000)); // subframe 3 is masked
-    EXPECT_FALSE(LineDecodes(*nibbles, 0, 0, 10));
-}
-
-TEST_F(RpfBadInput, LocationSectionPointingOutsideTheFile)
-{
-    const RpfFrame& frame = *frame_;
-    const uint32_t fileSize = static_cast<uint32_t>(frame.bytes.size());
-    const uint32_t coverageRecord = frame.layout.locationSection + kLocationRecords + kCoverageRecordIndex * 10;
-    EXPECT_FALSE(OpenFrame(frame.bytes, fileSize + 100)->opened);
-    EXPECT_FALSE(Opens(frame, [&](RpfFrame& f) { PatchRpfNumber(f, f.layout.headerSection + 44, fileSize + 8, 4); }));
-    EXPECT_FALSE(Opens(frame, [&](RpfFrame& f) { PatchRpfNumber(f, coverageRecord + 6, fileSize - 50, 4); }));
-    EXPECT_FALSE(Opens(frame, [&](RpfFrame& f) { PatchRpfNumber(f, coverageRecord + 6, 0xFFFFFFF0, 4); }));
-    EXPECT_FALSE(Opens(frame, [&](RpfFrame& f) { PatchRpfNumber(f, f.layout.locationSection + 6, 0xFFFF, 2); }));
-    // No records: the coverage is read from offset 0, where "NITF" is no latitude.
-    EXPECT_FALSE(Opens(frame, [&](RpfFrame& f) { PatchRpfNumber(f, f.layout.locationSection + 6, 0, 2); }));
-    // A component listed twice: the first record in file order counts.
-    auto twice = OpenPatched(frame, [&](RpfFrame& f) {
-        PatchRpfNumber(f, coverageRecord - 10, kCoverageSectionSubheader, 2);
-        PatchRpfNumber(f, coverageRecord - 4, f.layout.coverage, 4);
-        PatchRpfNumber(f, coverageRecord + 6, 0, 4);
-    });
-    ASSERT_TRUE(twice->opened);
-    EXPECT_EQ(twice->reader.FindComponentLocation(kCoverageSectionSubheader), frame.layout.coverage);
-    EXPECT_EQ(twice->reader.FindComponentLocation(kColorConverterSubsection), 0u);
-}
-
-TEST_F(RpfBadInput, MaskEntryOutsideTheFileFailsOnlyItsLines)
-{
-    auto opened = OpenPatched(*frame_, [](RpfFrame& f) {
-        PatchRpfNumber(f, f.layout.maskSubsection + 6 + 4 * 4, 0x7FFFFF00, 4); // subframe 4
-    });
-    ASSERT_TRUE(opened->opened);
-    EXPECT_FALSE(LineDecodes(*opened, 10));
-    EXPECT_TRUE(LineDecodes(*opened, 10, 0, 1023));
-    EXPECT_FALSE(LineDecodes(*opened, 11, 1024, 1100));
-    EXPECT_TRUE(LineDecodes(*opened, 300)); // the reader stays usable
-}
-
-TEST_F(RpfBadInput, CountsNeedingMoreMemoryThanTheFileHolds)
-{
-    const RpfFrame& frame = *frame_;
-    EXPECT_FALSE(Opens(frame, [](RpfFrame& f) { PatchRpfNumber(f, LookupRecord(f, 0) + 2, 0x10000000, 4); }));
-    EXPECT_FALSE(Opens(frame, [](RpfFrame& f) { PatchRpfNumber(f, f.layout.compressionSubheader + 2, 0xFFFF, 2); }));
-    // Four offset records sharing one table of 60,000 records would each claim most of the file.
-    EXPECT_FALSE(Opens(frame, [](RpfFrame& f) {
-        for (uint32_t table = 0; table < 4; ++table) {
-            PatchRpfNumber(f, LookupRecord(f, table) + 2, 60000, 4);
-            PatchRpfNumber(f, LookupRecord(f, table) + 10, 62, 4);
-        }
-    }));
-    EXPECT_FALSE(Opens(frame, [](RpfFrame& f) {
-        PatchRpfNumber(f, f.layout.colormapSubsection + kColorRecords + 2, 0x7FFFFFFF, 4);
-    }));
-    EXPECT_FALSE(Opens(frame, [](RpfFrame& f) { // a mask table of 65535 x 65535 entries
-        PatchRpfNumber(f, f.layout.imageDescription + 8, 0xFFFF, 2);
-        PatchRpfNumber(f, f.layout.imageDescription + 10, 0xFFFF, 2);
-    }));
-    EXPECT_FALSE(Opens(frame, [](RpfFrame& f) { PatchRpfNumber(f, f.layout.displayParameters + 4, 0x40000000, 4); }));
-}
-
-TEST_F(RpfBadInput, TruncatedFrames)
-{
-    const RpfFrame& frame = *frame_;
-    for (uint32_t cut : {frame.layout.headerSection + 20, frame.layout.locationSection + 30,
-                         frame.layout.coverage + 50, frame.layout.colormapSubsection + 200,
-                         frame.layout.lookupSubsection + 40000})
-        EXPECT_FALSE(OpenFrame(frame.bytes.substr(0, cut), frame.layout.headerSection)->opened) << cut;
-    // Cut inside the spatial data: the frame opens; lines past the cut fail.
-    auto opened = OpenFrame(frame.bytes.substr(0, frame.layout.spatialData + 2 * kRpfSubframeBytes + 500),
-                            frame.layout.headerSection);
-    ASSERT_TRUE(opened->opened);
-    EXPECT_TRUE(LineDecodes(*opened, 0, 0, 767));
-    EXPECT_FALSE(LineDecodes(*opened, 30, 0, 767));
-    EXPECT_FALSE(LineDecodes(*opened, 0));
-    EXPECT_TRUE(LineDecodes(*opened, 1, 0, 511));
-}
-
-TEST_F(RpfBadInput, CompressionSectionChecks)
-{
-    const RpfFrame& frame = *frame_;
-    const uint32_t subheader = frame.layout.compressionSubheader;
-    EXPECT_FALSE(Opens(frame, [&](RpfFrame& f) { PatchRpfNumber(f, subheader, 0, 2); }));
-    EXPECT_FALSE(Opens(frame, [&](RpfFrame& f) { PatchRpfNumber(f, subheader, 3, 2); }));
-    EXPECT_FALSE(Opens(frame, [&](RpfFrame& f) { PatchRpfNumber(f, subheader + 4, 1, 2); }));
-    EXPECT_FALSE(Opens(frame, [&](RpfFrame& f) { PatchRpfNumber(f, f.layout.lookupSubsection + 4, 13, 2); }));
-    auto second = OpenPatched(frame, [&](RpfFrame& f) { PatchRpfNumber(f, subheader, 2, 2); });
-    ASSERT_TRUE(second->opened);
-    RpfFramePlan plan;
-    plan.maskedSubframes = {3};
-    EXPECT_EQ(DecodeWholeFrame(*second), ExpectedRpfPixels(plan));
-    auto tableless = OpenPatched(frame, [&](RpfFrame& f) { PatchRpfNumber(f, subheader + 2, 0, 2); });
-    ASSERT_TRUE(tableless->opened);
-    EXPECT_FALSE(LineDecodes(*tableless, 0));
-}
-
-TEST_F(RpfBadInput, ColorSectionChecks)
-{
-    const RpfFrame& frame = *frame_;
-    EXPECT_FALSE(Opens(frame, [](RpfFrame& f) { PatchRpfNumber(f, f.layout.colormapSubsection + 4, 16, 2); }));
-    auto none = OpenPatched(frame, [](RpfFrame& f) { f.bytes[f.layout.colorGraySubheader] = 0; });
-    ASSERT_TRUE(none->opened);
-    EXPECT_FALSE(none->reader.colorGraySection.IsColorTable());
-    EXPECT_FALSE(none->reader.colorGraySection.IsGrayTable());
-    uint8_t grey = 0;
-    EXPECT_FALSE(none->reader.colorGraySection.GetPaletteGray(0, grey));
-}
-
-TEST_F(RpfBadInput, CoverageCornerRangesInBothByteOrders)
-{
-    const uint32_t coverage = frame_->layout.coverage;
-    EXPECT_TRUE(Opens(*frame_, [&](RpfFrame& f) { PatchDouble(f, coverage, 90.0); }));
-    EXPECT_TRUE(Opens(*frame_, [&](RpfFrame& f) { PatchDouble(f, coverage + 8, -180.0); }));
-    EXPECT_FALSE(Opens(*frame_, [&](RpfFrame& f) { PatchDouble(f, coverage, 90.000001); }));
-    EXPECT_FALSE(Opens(*frame_, [&](RpfFrame& f) { PatchDouble(f, coverage + 56, std::nan("")); }));
-    // The resolutions and intervals are not corners.
-    EXPECT_TRUE(Opens(*frame_, [&](RpfFrame& f) { PatchDouble(f, coverage + 64, 1e9); }));
-    // A little-endian frame is held to the same ranges.
-    RpfFrame little = BuildTestFrame(RpfProduct::Cib, false);
-    EXPECT_TRUE(Opens(little, [](RpfFrame&) {}));
-    EXPECT_FALSE(Opens(little, [&](RpfFrame& f) { PatchDouble(f, f.layout.coverage + 40, 200.0); }));
-}

@@ -1,0 +1,36 @@
+// Every cap the library sets, in one place. Memory otherwise follows the
+// file: a table, stream or buffer sized from a file is first checked to lie
+// within it. These caps stand where the file cannot bound a size.
+#pragma once
+
+#include <cstdint>
+
+// The largest file offset the reader can seek to (its seeks take 32-bit
+// signed offsets): every read ends at or before it, and a NITF file larger
+// than this is not read at all.
+constexpr uint64_t kLargestReaderOffset = 0x7FFFFFFF;
+
+// Path bytes a reader holds, the terminator included; longer paths are refused.
+constexpr unsigned kReaderPathSize = 260;
+
+// Decoded JPEG and bi-level bitmaps of one image, all its blocks together;
+// a larger image opens and its rows fail.
+constexpr uint64_t kMaxDecodedImageBytes = uint64_t(1) << 30;
+
+// One allocation of libtiff's working memory while it decodes a bi-level
+// strip: its run arrays take 16 bytes per column of the declared width,
+// which a few bytes of strip can claim.
+constexpr uint64_t kMaxBiLevelLibraryAllocation = uint64_t(256) << 20;
+
+// The strips of NITF blocks a draw holds, one per block column (per band
+// and block column when bands are stored apart); larger strips are read a
+// row at a time.
+constexpr uint64_t kMaxBlockCacheBytes = uint64_t(64) << 20;
+
+// The RPF subframes a draw holds, one row of them; larger subframes are read
+// a code row at a time.
+constexpr uint64_t kMaxSubframeCacheBytes = uint64_t(1) << 20;
+
+// The largest factor by which an "I1" frame may have been downsampled: a
+// frame smaller than its block by more does not fill it.
+constexpr uint32_t kLargestDownsampling = 8;

@@ -1,0 +1,210 @@
+#include "tests/SampleFiles.h"
+
+#include "tests/fixtures/BiLevelWriter.h"
+#include "tests/fixtures/JpegBlockWriter.h"
+#include "tests/fixtures/NitfImageWriter.h"
+#include "tests/fixtures/RpfFrameWriter.h"
+
+#include <map>
+
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__) // gcc
+#define VX_SANITIZER_OWNS_MALLOC 1
+#elif defined(__has_feature) // clang
+#if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
+#define VX_SANITIZER_OWNS_MALLOC 1
+#endif
+#endif
+#ifdef VX_SANITIZER_OWNS_MALLOC
+extern "C" size_t __sanitizer_get_current_allocated_bytes(); // gcc ships no header for it
+#else
+#include <malloc.h>
+#endif
+
+namespace {
+
+constexpr uint32_t kFaxWidth = 96, kFaxHeight = 48;
+const char kUtmCorners[] = "335000004000000335060004000000335060003992000335000003992000"; // zone 33 north
+
+std::string AsString(const Bytes& bytes)
+{
+    return std::string(bytes.begin(), bytes.end());
+}
+
+NitfImagePlan Image(const std::string& IREP, size_t bands, char IMODE, char ICORDS = ' ', const char* IGEOLO = "")
+{
+    NitfImagePlan plan;
+    plan.rows = 70;
+    plan.columns = 90;
+    plan.IREP = IREP;
+    plan.IMODE = IMODE;
+    plan.ICORDS = ICORDS;
+    plan.IGEOLO = IGEOLO;
+    plan.bands.assign(bands, NitfBandPlan{});
+    for (size_t band = 0; bands == 3 && band < 3; ++band)
+        plan.bands[band].IREPBAND = std::string(1, "RGB"[band]);
+    plan.NBPR = plan.NBPC = 3; // the edge blocks padded
+    plan.NPPBH = plan.NPPBV = 32;
+    return plan;
+}
+
+std::string Uncompressed(const NitfImagePlan& plan, unsigned seed)
+{
+    const uint64_t values = plan.bands[0].NELUT ? plan.bands[0].NELUT : 1u << (plan.ABPP ? plan.ABPP : plan.NBPP);
+    const std::vector<std::string> blocks = BuildImageBlocks(plan, [&](int32_t band, int32_t row, int32_t column) {
+        return (uint64_t(band * 70 + row * 3 + column * 5) + seed * 11) * (values > 256 ? 29 : 1) % values;
+    });
+    std::vector<bool> stored(blocks.size());
+    for (size_t i = 0; i < stored.size(); ++i)
+        stored[i] = i % 4 != 1;
+    return BuildImageFile(plan, plan.IC == "NM" ? BuildMaskedData(blocks, stored, 8) : JoinBlocks(blocks),
+                          plan.downgradeEvent);
+}
+
+std::string Frame(RpfProduct product, bool bigEndian, std::set<uint32_t> masked)
+{
+    RpfFramePlan plan;
+    plan.product = product;
+    plan.bigEndian = bigEndian;
+    plan.indexImage = PatternIndexImage();
+    plan.maskedSubframes = std::move(masked);
+    return BuildRpfFrame(plan).bytes;
+}
+
+// A 32 x 32 grey or colour image of 2 x 2 blocks; streamScale > 1 makes each
+// stream that many times larger than its block, the lower two progressive
+// (their coefficient buffers are as large as the frame).
+std::string Jpeg(int components, unsigned seed, uint32_t streamScale = 1)
+{
+    const bool grey = components == 1;
+    NitfImagePlan plan = Image(grey ? "MONO" : "YCbCr601", size_t(components), grey ? 'B' : 'P');
+    plan.IC = "C3";
+    plan.COMRAT = "00.0";
+    plan.rows = plan.columns = 32;
+    plan.NBPR = plan.NBPC = 2;
+    plan.NPPBH = plan.NPPBV = 16;
+    JpegBlockPlan block;
+    block.width = block.height = 16 * streamScale;
+    block.components = components;
+    std::vector<Bytes> streams;
+    for (unsigned i = 0; i < 4; ++i) {
+        block.progressive = streamScale > 1 && i >= 2;
+        streams.push_back(EncodeJpegBlock(streamScale > 1 ? Bytes(size_t(block.width) * block.height, 0x80)
+                                                          : TestPattern(16, 16, components, seed * 4 + i),
+                                          block));
+    }
+    return BuildImageFile(plan, AsString(BuildNitfJpegData(streams, NitfApp6Plan{2, 2, 0, uint8_t(grey ? 0 : 2)})));
+}
+
+std::string BiLevel(bool twoDimensional, unsigned seed)
+{
+    std::vector<uint8_t> packed(size_t(kFaxWidth / 8) * kFaxHeight);
+    for (size_t i = 0; i < packed.size(); ++i)
+        packed[i] = uint8_t((i * 37 + seed * 11) ^ (i / 12));
+    NitfImagePlan plan;
+    plan.columns = int32_t(kFaxWidth);
+    plan.rows = int32_t(kFaxHeight);
+    plan.NBPP = 1;
+    plan.IC = "C1";
+    plan.COMRAT = twoDimensional ? "2DS " : "1D  ";
+    return BuildImageFile(plan, AsString(EncodeT4Strip(packed, kFaxWidth, kFaxHeight, twoDimensional)));
+}
+
+} // namespace
+
+std::vector<SampleFile> FilesOfEveryKind(unsigned seed)
+{
+    NitfImagePlan lut = Image("RGB/LUT", 1, 'B');
+    lut.bands[0] = NitfBandPlan{"LU", 3, 200, RgbLookupTables(200)};
+    NitfImagePlan mono16 = Image("MONO", 1, 'B');
+    mono16.NBPP = 16;
+    mono16.ABPP = 12;
+    NitfImagePlan nitf20 = Image("RGB", 3, 'S', 'U', "18SUJ234830647918SUJ244830647918SUJ244830547918SUJ2348305479");
+    nitf20.version21 = false;
+    nitf20.downgradeEvent = true;
+    nitf20.comments = {"first comment", "second comment"};
+    nitf20.UDID = Tre("TESTXX", "user defined");
+    NitfImagePlan masked = Image("MONO", 1, 'B', 'N', kUtmCorners);
+    masked.IC = "NM";
+    return {
+        {"compressed_jpeg_grey", Jpeg(1, seed)},
+        {"compressed_jpeg_colour", Jpeg(3, seed)},
+        {"compressed_bilevel_1d", BiLevel(false, seed)},
+        {"compressed_bilevel_2d", BiLevel(true, seed)},
+        {"cadrg_big_endian", Frame(RpfProduct::Cadrg, true, {seed % kRpfSubframeCount, 35})},
+        {"cadrg_little_endian", Frame(RpfProduct::Cadrg, false, {seed % kRpfSubframeCount, 35})},
+        {"cib", Frame(RpfProduct::Cib, true, {7})},
+        {"mono_geographic",
+         Uncompressed(Image("MONO", 1, 'B', 'G', "324530N0784510W324530N0784400W324415N0784400W324415N0784510W"),
+                      seed)},
+        {"rgb_pixel_decimal", // rotated: not north up
+         Uncompressed(Image("RGB", 3, 'P', 'D', "+45.000+010.000+45.100+010.200+45.050+010.250+44.950+010.050"), seed)},
+        {"rgb_row_utm", Uncompressed(Image("RGB", 3, 'R', 'N', kUtmCorners), seed)},
+        {"rgb_band_sequential_mgrs_20", Uncompressed(nitf20, seed)},
+        {"lookup_table", Uncompressed(lut, seed)},
+        {"mono16", Uncompressed(mono16, seed)},
+        {"masked_blocks_utm", Uncompressed(masked, seed)},
+    };
+}
+
+std::vector<SampleFile> HostileFiles()
+{
+    RpfFramePlan shortTable;
+    shortTable.indexImage = std::vector<uint8_t>(kRpfFrameSide * kRpfFrameSide, 3);
+    shortTable.colorTableRecords = {32};
+    NitfFilePlan noSections; // RPFHDR present, the RPF sections missing
+    noSections.images.push_back({std::string(100, 'x'), std::string(100, 'y')});
+    noSections.userHeaderData = Tre("RPFHDR", std::string(48, '\0'));
+    NitfImagePlan plan;
+    plan.rows = plan.columns = 8;
+    plan.COMRAT = "00.0";
+    plan.IC = "C2"; // parses, never served
+    const std::string dpcm = BuildImageFile(plan, std::string(64, '\0'));
+    plan.IC = "C8"; // not even parsed
+    const std::string jpeg2000 = BuildImageFile(plan, std::string(64, '\0'));
+    plan.IC = "NC";
+    const std::string cut = BuildImageFile(plan, std::string(64, '\0')).substr(0, 300);
+    plan.PVTYPE = "R";
+    plan.NBPP = 32;
+    return {{"rpf_short_colour_table", BuildRpfFrame(shortTable).bytes},
+            {"rpf_sections_missing", BuildNitfFile(noSections)},
+            {"dpcm", dpcm},
+            {"jpeg2000", jpeg2000},
+            {"real_pixels", BuildImageFile(plan, std::string(256, '\0'))},
+            {"cut_header", cut},
+            {"jpeg_streams_larger_than_blocks", Jpeg(1, 0, 16)}};
+}
+
+const std::string& SampleBytes(const std::string& name)
+{
+    static std::map<std::string, std::string> files;
+    if (files.empty())
+        for (const auto& list : {FilesOfEveryKind(), HostileFiles()})
+            for (const SampleFile& file : list)
+                files[file.name] = file.bytes;
+    return files.at(name);
+}
+
+std::string OpenDrawClose(const HandlerExports& rh, const std::string& path, uint32_t maxRows)
+{
+    OpenedImage image(rh, path);
+    const RHHandle& h = image.handle;
+    std::vector<uint8_t> pixels;
+    uint32_t failedRows = 0;
+    if (image.Ready() && !image.Draw(0, 0, int32_t(h.width), int32_t(std::min(h.height, maxRows)), pixels, failedRows))
+        failedRows = UINT32_MAX;
+    std::string drawn = "result " + std::to_string(image.result) + " status " + std::to_string(h.status) + " failed " +
+        std::to_string(failedRows) + " size " + std::to_string(h.width) + " x " + std::to_string(h.height) + " kind " +
+        std::to_string(h.pixelKind) + "\n";
+    if (h.palette != nullptr)
+        drawn.append(reinterpret_cast<const char*>(h.palette->entries), size_t(h.palette->entryCount) * 3);
+    return drawn.append(pixels.begin(), pixels.end());
+}
+
+size_t HeapInUse()
+{
+#ifdef VX_SANITIZER_OWNS_MALLOC
+    return __sanitizer_get_current_allocated_bytes();
+#else
+    return mallinfo2().uordblks;
+#endif
+}
