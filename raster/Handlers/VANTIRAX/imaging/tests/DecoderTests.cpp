@@ -1,23 +1,142 @@
-// The JPEG decoder on NITF JPEG data (IC "C3"/"M3", lossless "C5") coded by
-// libjpeg and by the lossless fixture writer: each stream decodes as its
-// reference (libjpeg's decoding, or the samples themselves), and streams it
-// cannot decode safely are refused.
+// The imaging binding, and the decoder on image data placed in a file as a NITF file holds it: bi-level
+// (IC "C1") T.4 strips coded by libtiff, decoded bit for bit; NITF JPEG data (IC "C3"/"M3", lossless
+// "C5") coded by libjpeg and the lossless fixture writer, each stream decoding as its reference
+// (libjpeg's decoding, or the samples themselves); and the data and calls it must refuse.
+#include "imaging/ImagingLibrary.h"
 #include "imaging/LeadToolLibWrapper.h"
-#include "imaging/tests/DecoderTestFile.h"
+#include "imaging/NitfJpegDefaults.h"
+#include "base/ByteOrder.h"
+#include "base/FileReader.h"
+#include "tests/fixtures/BiLevelWriter.h"
 #include "tests/fixtures/JpegBlockWriter.h"
-#include "tests/fixtures/LosslessJpegWriter.h"
+#include "tests/fixtures/TempFiles.h"
 
 #include <gtest/gtest.h>
 
 #include <set>
 #include <stdexcept>
+#include <string>
 
 #include <sys/resource.h>
 #include <unistd.h>
 
 namespace {
 
-constexpr uint32_t kSide = 16; // the blocks of every test
+constexpr uint32_t kOffset = 137; // of the data in its file: odd, so no alignment is assumed
+constexpr uint32_t kSide = 16;    // the JPEG blocks of every test
+
+// Image data at kOffset of a temporary file, opened as the decoder meets it inside a NITF file.
+struct DataFile {
+    explicit DataFile(const Bytes& data)
+        : file(std::string(kOffset, 'x') + std::string(data.begin(), data.end()), ".ntf")
+    {
+        reader.OpenFile(file.c_str(), kShareDenyWrite);
+    }
+    TempFile file;
+    CFileReader reader;
+};
+
+TEST(Binding, NeedsBothModulesAndEveryEntryPointAndBindsAgainAfterAReset)
+{
+    // The built-in modules less one module (entry SIZE_MAX), or one entry point of it; module
+    // moduleCount: neither module.
+    const ImagingModuleTable& builtIn = BuiltInImagingModules();
+    std::vector<std::pair<size_t, size_t>> cases = {{builtIn.moduleCount, SIZE_MAX}};
+    for (size_t m = 0; m < builtIn.moduleCount; ++m)
+        for (size_t e = 0; e <= builtIn.modules[m].entryCount; ++e)
+            cases.push_back({m, e < builtIn.modules[m].entryCount ? e : SIZE_MAX});
+    for (const auto& [module, entry] : cases) {
+        std::vector<std::vector<ImagingEntry>> entries(builtIn.moduleCount);
+        std::vector<ImagingModule> modules;
+        for (size_t m = 0; m < builtIn.moduleCount && module < builtIn.moduleCount; ++m) {
+            for (size_t e = 0; e < builtIn.modules[m].entryCount; ++e)
+                if (m != module || e != entry)
+                    entries[m].push_back(builtIn.modules[m].entries[e]);
+            if (m != module || entry != SIZE_MAX)
+                modules.push_back({builtIn.modules[m].name, entries[m].data(), entries[m].size()});
+        }
+        const ImagingModuleTable partial{modules.data(), modules.size()};
+        ResetLibrary();
+        UseImagingModules(&partial);
+        EXPECT_FALSE(EnsureLibrary()) << "module " << module << " entry " << entry;
+        CLeadToolLibWrapper decoder;
+        EXPECT_FALSE(decoder.PrepareBiLevel());
+        EXPECT_EQ(decoder.kind, kNotPrepared);
+        UseImagingModules(nullptr);
+    }
+    ResetLibrary();
+    ImagingBinding binding{};
+    EXPECT_FALSE(CopyBinding(binding));
+    EXPECT_EQ(binding.L_LoadMemory, nullptr);
+    CLeadToolLibWrapper decoder;
+    EXPECT_TRUE(decoder.PrepareBiLevel());
+    EXPECT_EQ(decoder.kind, kBiLevelDecoder);
+    EXPECT_TRUE(CopyBinding(binding));
+    EXPECT_NE(binding.L_LoadMemory, nullptr);
+}
+
+constexpr uint32_t kWidth = 77, kHeight = 23, kStride = (kWidth + 7) / 8; // rows of no whole number of bytes
+
+Bytes PackedPattern()
+{
+    Bytes packed(size_t(kStride) * kHeight);
+    for (uint32_t y = 0; y < kHeight; ++y)
+        for (uint32_t x = 0; x < kWidth; ++x)
+            if ((x / 5 + y / 3) % 3 == 0 || x == y)
+                packed[y * kStride + x / 8] |= uint8_t(0x80 >> (x % 8));
+    return packed;
+}
+
+TEST(BiLevelDecode, OneAndTwoDimensionalStripsDecodeBitForBit)
+{
+    const Bytes packed = PackedPattern();
+    for (bool twoDimensional : {false, true}) {
+        const Bytes strip = EncodeT4Strip(packed, kWidth, kHeight, twoDimensional);
+        DataFile file(strip);
+        CLeadToolLibWrapper decoder;
+        ASSERT_TRUE(decoder.PrepareBiLevel());
+        ASSERT_TRUE(decoder.Open(file.reader, kOffset, 1, uint32_t(strip.size()), 1, 1, kWidth, kHeight,
+                                 !twoDimensional));
+        EXPECT_EQ(BigEndian32(decoder.tiffHeader + kTiffT4OptionsValue), twoDimensional ? 5u : 4u);
+        EXPECT_EQ(BigEndian32(decoder.tiffHeader + kTiffStripByteCountsValue), strip.size());
+        for (uint32_t y = 0; y < kHeight; ++y) {
+            // Columns 3 to 76, a span that starts inside a byte; a set bit is black (0).
+            Bytes row(kWidth - 3 + 1, 0x11);
+            ASSERT_TRUE(decoder.GetRow(0, y, 3, kWidth - 1, (kWidth - 3 + 7) / 8, row.data()));
+            for (uint32_t x = 3; x < kWidth; ++x)
+                ASSERT_EQ(row[x - 3], (packed[y * kStride + x / 8] & (0x80 >> (x % 8))) ? 0 : 255)
+                    << x << "," << y << " 2-D " << twoDimensional;
+            ASSERT_EQ(row.back(), 0x11) << "wrote past the span";
+        }
+        Bytes row(kWidth);
+        EXPECT_FALSE(decoder.GetRow(1, 0, 0, kWidth - 1, kStride, row.data())); // block 1 of a strip of one
+    }
+}
+
+// Garbage, or a strip cut short: whatever comes out, no crash. LI beyond the file, and more rows than
+// the strip has bits: refused before decoding.
+TEST(BiLevelDecode, CorruptOrShortStripsFailCleanly)
+{
+    const Bytes strip = EncodeT4Strip(PackedPattern(), kWidth, kHeight, true);
+    Bytes garbage(strip.size()), row(kWidth);
+    for (size_t i = 0; i < garbage.size(); ++i)
+        garbage[i] = uint8_t(i * 131 + 7);
+    for (const Bytes& data : {garbage, Bytes(strip.begin(), strip.begin() + strip.size() / 3)}) {
+        DataFile file(data);
+        CLeadToolLibWrapper decoder;
+        ASSERT_TRUE(decoder.PrepareBiLevel());
+        decoder.Open(file.reader, kOffset, 1, uint32_t(data.size()), 1, 1, kWidth, kHeight, false);
+        decoder.GetRow(0, kHeight - 1, 0, kWidth - 1, kStride, row.data());
+    }
+    DataFile file(strip);
+    CLeadToolLibWrapper decoder;
+    ASSERT_TRUE(decoder.PrepareBiLevel());
+    const uint32_t LI = uint32_t(strip.size());
+    EXPECT_FALSE(decoder.Open(file.reader, kOffset, 1, LI + 1, 1, 1, kWidth, kHeight, false));
+    decoder.FreeBitmaps();
+    EXPECT_FALSE(decoder.Open(file.reader, kOffset, 1, LI, 1, 1, kWidth, LI * 8 + 8, false));
+    EXPECT_EQ(decoder.bitmaps, nullptr);
+}
 
 // The stream with one byte set, at an offset from the first marker of the given code.
 Bytes SetAfterMarker(Bytes stream, uint8_t code, size_t at, uint8_t value)
@@ -30,28 +149,25 @@ Bytes SetAfterMarker(Bytes stream, uint8_t code, size_t at, uint8_t value)
     return stream;
 }
 
-// NITF JPEG data of blocks of kSide x kSide side by side, prepared and opened.
+// NITF JPEG data of blocks of side x side side by side, prepared and opened.
 struct OpenedJpeg {
-    DecoderTestFile file;
+    DataFile file;
     CLeadToolLibWrapper decoder;
     bool opened = false;
 
-    OpenedJpeg(const Bytes& data, uint32_t blocks, uint32_t bands = 1, bool downsampled = false,
-               uint32_t side = kSide)
+    OpenedJpeg(const Bytes& data, uint32_t blocks, uint32_t bands = 1, bool downsampled = false, uint32_t side = kSide)
         : file(data)
     {
-        opened = decoder.PrepareJpeg(file.reader, kTestDataOffset, uint32_t(data.size()), 8) &&
-                 decoder.Open(file.reader, kTestDataOffset, blocks, uint32_t(data.size()), 8, bands, side * blocks,
-                              side, false, side, side, downsampled);
+        opened = decoder.PrepareJpeg(file.reader, kOffset, uint32_t(data.size()), 8) &&
+                 decoder.Open(file.reader, kOffset, blocks, uint32_t(data.size()), 8, bands, side * blocks, side, false,
+                              side, side, downsampled);
     }
-
     // Columns first to last of a row of a grey block; empty when GetRow fails.
     Bytes Row(uint32_t block, uint32_t row, uint32_t first = 0, uint32_t last = kSide - 1)
     {
         Bytes pixels(last - first + 1);
         return decoder.GetRow(block, row, first, last, uint32_t(pixels.size()), pixels.data()) ? pixels : Bytes{};
     }
-
     // Every row of a block, as GetRow delivers them.
     Bytes Block(uint32_t block, uint32_t bands = 1)
     {
@@ -64,21 +180,20 @@ struct OpenedJpeg {
 
 TEST(JpegDecode, StreamsDecodeAsTheirReference)
 {
-    struct Case {
+    struct Case { // the APP6 streamColor: 0 grey, 1 R,G,B coded, 2 YCbCr coded
         std::string what;
         Bytes stream, expected;
         int components = 1;
-        uint8_t quality = 0, streamColor = 0; // APP6; colour: 0 grey, 1 R,G,B coded, 2 YCbCr coded
+        uint8_t quality = 0, streamColor = 0;
         bool opens = true;
     };
     std::vector<Case> cases;
-    const Bytes colour = TestPattern(kSide, kSide, 3, 2);
     for (bool rgbCoding : {false, true}) {
         JpegBlockPlan plan;
         plan.components = 3;
         plan.rgbCoding = rgbCoding;
-        const Bytes stream = EncodeJpegBlock(colour, plan);
-        cases.push_back({rgbCoding ? "R,G,B coded" : "YCbCr coded", stream, DecodeJpegBlock(stream, 3), 3, 0,
+        const Bytes stream = EncodeJpegBlock(TestPattern(kSide, kSide, 3, 2), plan);
+        cases.push_back({rgbCoding ? "R,G,B" : "YCbCr", stream, DecodeJpegBlock(stream, 3), 3, 0,
                          uint8_t(rgbCoding ? 1 : 2)});
     }
     // Lossless: every predictor, grey and colour, restart intervals, a point transform dropping two low bits.
@@ -108,10 +223,8 @@ TEST(JpegDecode, StreamsDecodeAsTheirReference)
             plan.keepDqt = keepDqt;
             plan.keepDht = keepDht;
             Bytes stream = EncodeJpegBlock(grey, plan);
-            if (commented) {
-                complete.insert(complete.begin() + 2, comment.begin(), comment.end());
-                stream.insert(stream.begin() + 2, comment.begin(), comment.end());
-            }
+            for (Bytes* s : {&complete, &stream})
+                s->insert(s->begin() + 2, comment.begin(), commented ? comment.end() : comment.begin());
             const std::string what =
                 std::string(commented ? "commented, " : "") + (keepDqt ? "DQT " : "") + (keepDht ? "DHT" : "");
             cases.push_back({what + " quality 3", stream, DecodeJpegBlock(complete, 1), 1, 3});
@@ -143,47 +256,24 @@ TEST(JpegDecode, StreamsDecodeAsTheirReference)
     // (a sanitizer's shadow memory takes a few of its own).
     const long mostPagesTouched = (768L << 20) / sysconf(_SC_PAGESIZE);
     for (const Case& c : cases) {
+        SCOPED_TRACE(c.what + ", " + std::to_string(c.components) + " components");
         rusage before{}, after{};
         getrusage(RUSAGE_SELF, &before);
         OpenedJpeg image(BuildNitfJpegData({c.stream}, NitfApp6Plan{1, 1, c.quality, c.streamColor}), 1,
                          uint32_t(c.components), false, c.what.find("32000") == std::string::npos ? kSide : 32000);
         getrusage(RUSAGE_SELF, &after);
-        EXPECT_LT(after.ru_minflt - before.ru_minflt, mostPagesTouched) << c.what;
-        ASSERT_EQ(image.opened, c.opens) << c.what << ", " << c.components << " components";
-        if (!c.opens)
-            continue;
-        EXPECT_EQ(image.Block(0, uint32_t(c.components)), c.expected)
-            << c.what << ", " << c.components << " components";
-        EXPECT_EQ(image.decoder.loaderConverted, c.components == 3 ? 1 : 0) << c.what;
+        EXPECT_LT(after.ru_minflt - before.ru_minflt, mostPagesTouched);
+        ASSERT_EQ(image.opened, c.opens);
+        if (c.opens) {
+            EXPECT_EQ(image.Block(0, uint32_t(c.components)), c.expected);
+            EXPECT_EQ(image.decoder.loaderConverted, c.components == 3 ? 1 : 0);
+        }
     }
-}
-
-TEST(JpegDecode, BlocksAndSpansStayWithinWhatTheCallerAsked)
-{
-    std::vector<Bytes> blocks;
-    for (unsigned i = 0; i < 4; ++i)
-        blocks.push_back(EncodeJpegBlock(TestPattern(kSide, kSide, 1, i), JpegBlockPlan{}));
-    OpenedJpeg image(BuildNitfJpegData(blocks, NitfApp6Plan{4, 1, 0, 0}), 4);
-    ASSERT_TRUE(image.opened);
-    EXPECT_EQ(image.decoder.app6[12] | (image.decoder.app6[13] << 8), 4); // blocks per row, host order
-    for (unsigned i = 0; i < 4; ++i)
-        EXPECT_EQ(image.Block(i), DecodeJpegBlock(blocks[i], 1)) << "block " << i;
-    const Bytes full = image.Block(1);
-    Bytes span(40, 0xEE);
-    EXPECT_FALSE(image.decoder.GetRow(4, 0, 0, kSide - 1, kSide, span.data()));
-    // Columns 10 to 15 of row 5: six bytes asked, the rest untouched; more asked: only what is there.
-    for (uint32_t asked : {6u, 40u}) {
-        ASSERT_TRUE(image.decoder.GetRow(1, 5, 10, 15, asked, span.data()));
-        EXPECT_EQ(Bytes(span.begin(), span.begin() + 6),
-                  Bytes(full.begin() + 5 * kSide + 10, full.begin() + 6 * kSide));
-        EXPECT_EQ(span[6], 0xEE);
-    }
-    EXPECT_FALSE(image.decoder.GetRow(0, kSide, 0, 0, 1, span.data()));
-    EXPECT_FALSE(image.decoder.GetRow(0, 0, kSide, kSide, 1, span.data()));
 }
 
 // Block 0 holds a whole frame; block 1 the case's frame, whose rows are its pixels repeated
-// (across, down) times ("I1"), or fail (0) when it does not fill the block.
+// (across, down) times ("I1"), or fail (0) when it does not fill the block. Rows, spans, blocks
+// and byte counts beyond what is there are refused, and no byte is written past those asked.
 TEST(JpegDecode, BlocksGiveRowsOnlyFromFramesThatFillThem)
 {
     struct Case { const char* what; uint32_t width, height; int components; bool downsampled; uint32_t across, down; };
@@ -197,21 +287,34 @@ TEST(JpegDecode, BlocksGiveRowsOnlyFromFramesThatFillThem)
                           {"I1 1 column: 16 times is more than 8", 1, kSide, 1, true, 0, 0},
                           {"I1 three components in a one-band image", 8, 8, 3, true, 0, 0}};
     const Bytes whole = EncodeJpegBlock(TestPattern(kSide, kSide, 1, 20), {});
+    const Bytes wholeDecoded = DecodeJpegBlock(whole, 1);
     for (const Case& c : cases) {
+        SCOPED_TRACE(c.what);
         const Bytes frame = EncodeJpegBlock(TestPattern(c.width, c.height, c.components, 21),
                                             JpegBlockPlan{c.width, c.height, c.components});
         const Bytes decoded = DecodeJpegBlock(frame, c.components);
         OpenedJpeg image(BuildNitfJpegData({whole, frame}, NitfApp6Plan{2, 1, 0, 0}), 2, 1, c.downsampled);
-        ASSERT_TRUE(image.opened) << c.what;
-        EXPECT_EQ(image.Block(0), DecodeJpegBlock(whole, 1)) << c.what;
+        ASSERT_TRUE(image.opened);
+        EXPECT_EQ(image.decoder.app6[12] | (image.decoder.app6[13] << 8), 2); // blocks per row, host order
+        EXPECT_EQ(image.Block(0), wholeDecoded);
         for (uint32_t row = 0; row < kSide; ++row) {
             Bytes expected;
             for (uint32_t column = 0; c.across != 0 && column < kSide; ++column)
                 expected.push_back(decoded[(row / c.down) * c.width + column / c.across]);
-            EXPECT_EQ(image.Row(1, row), expected) << c.what << " row " << row;
+            EXPECT_EQ(image.Row(1, row), expected) << "row " << row;
             EXPECT_EQ(image.Row(1, row, 3, 12), c.across ? Bytes(expected.begin() + 3, expected.begin() + 13) : Bytes{})
-                << c.what << " row " << row; // a span starting mid-block
+                << "row " << row; // a span starting mid-block
         }
+        // Columns 10 to 15 of row 5: six bytes asked, the rest untouched; more asked: only what is there.
+        Bytes span(40, 0xEE);
+        for (uint32_t asked : {6u, 40u}) {
+            ASSERT_TRUE(image.decoder.GetRow(0, 5, 10, 15, asked, span.data()));
+            EXPECT_EQ(Bytes(span.begin(), span.begin() + 6), Bytes(&wholeDecoded[90], &wholeDecoded[96]));
+            EXPECT_EQ(span[6], 0xEE);
+        }
+        EXPECT_FALSE(image.decoder.GetRow(2, 0, 0, kSide - 1, kSide, span.data()));
+        EXPECT_FALSE(image.decoder.GetRow(0, kSide, 0, 0, 1, span.data()));
+        EXPECT_FALSE(image.decoder.GetRow(0, 0, kSide, kSide, 1, span.data()));
     }
 }
 
@@ -247,11 +350,11 @@ TEST(JpegDecode, LastBlockWithoutEndOfImageIsDamaged)
     open.keepEoi = false;
     const Bytes pattern = TestPattern(kSide, kSide, 1, 1);
     const Bytes data = BuildNitfJpegData({EncodeJpegBlock(pattern, {}), EncodeJpegBlock(pattern, open)}, {});
-    DecoderTestFile file(data);
+    DataFile file(data);
     CLeadToolLibWrapper decoder;
-    ASSERT_TRUE(decoder.PrepareJpeg(file.reader, kTestDataOffset, 0, 8));
+    ASSERT_TRUE(decoder.PrepareJpeg(file.reader, kOffset, 0, 8));
     try {
-        decoder.Open(file.reader, kTestDataOffset, 2, uint32_t(data.size()), 8, 1, 32, 16, false);
+        decoder.Open(file.reader, kOffset, 2, uint32_t(data.size()), 8, 1, 32, 16, false);
         FAIL() << "no exception";
     } catch (const std::runtime_error& error) {
         EXPECT_STREQ(error.what(), kDamagedImageText);
@@ -259,7 +362,7 @@ TEST(JpegDecode, LastBlockWithoutEndOfImageIsDamaged)
     // The first block stays decoded; a second Open without FreeBitmaps is refused.
     Bytes row(kSide);
     EXPECT_TRUE(decoder.GetRow(0, 0, 0, kSide - 1, kSide, row.data()));
-    EXPECT_THROW(decoder.Open(file.reader, kTestDataOffset, 2, 0, 8, 1, 32, 16, false), std::runtime_error);
+    EXPECT_THROW(decoder.Open(file.reader, kOffset, 2, 0, 8, 1, 32, 16, false), std::runtime_error);
     decoder.FreeBitmaps();
     EXPECT_FALSE(decoder.GetRow(0, 0, 0, kSide - 1, kSide, row.data()));
 }
@@ -272,29 +375,25 @@ TEST(JpegDecode, CorruptDataAndDecodersNotPreparedFailCleanly)
     for (size_t at = corrupt.size() - 40; at < corrupt.size() - 2; ++at)
         corrupt[at] = uint8_t(at * 97);
     OpenedJpeg damaged(BuildNitfJpegData({corrupt}, {}), 1);
-    Bytes row(kSide);
-    EXPECT_TRUE(!damaged.opened || damaged.decoder.GetRow(0, 0, 0, kSide - 1, kSide, row.data()));
-
+    EXPECT_TRUE(!damaged.opened || !damaged.Row(0, 0).empty());
     // More blocks than the data can hold: refused before anything is allocated. Preparing needs the
     // NITF APP6 segment at the data offset and 8-bit samples; opening needs a prepared decoder.
-    const Bytes data = BuildNitfJpegData({block}, {});
-    DecoderTestFile file(data);
-    CLeadToolLibWrapper decoder;
-    EXPECT_FALSE(decoder.PrepareJpeg(file.reader, kTestDataOffset, 0, 12));
-    EXPECT_FALSE(decoder.PrepareJpeg(file.reader, kTestDataOffset, 0, 16));
-    EXPECT_FALSE(decoder.PrepareJpeg(file.reader, kTestDataOffset + 1, 0, 8));
-    EXPECT_FALSE(decoder.Open(file.reader, kTestDataOffset, 1, 0, 8, 1, kSide, kSide, false));
-    ASSERT_TRUE(decoder.PrepareJpeg(file.reader, kTestDataOffset, 0, 8));
-    EXPECT_FALSE(decoder.Open(file.reader, kTestDataOffset, 1, 0, 12, 1, kSide, kSide, false));
-    CLeadToolLibWrapper huge;
-    ASSERT_TRUE(huge.PrepareJpeg(file.reader, kTestDataOffset, 0, 8));
-    EXPECT_FALSE(huge.Open(file.reader, kTestDataOffset, 0xFFFFFFFF, 0, 8, 1, kSide, kSide, false));
+    Bytes data = BuildNitfJpegData({block}, {});
+    DataFile file(data);
+    CLeadToolLibWrapper decoder, huge;
+    EXPECT_FALSE(decoder.PrepareJpeg(file.reader, kOffset, 0, 12));
+    EXPECT_FALSE(decoder.PrepareJpeg(file.reader, kOffset, 0, 16));
+    EXPECT_FALSE(decoder.PrepareJpeg(file.reader, kOffset + 1, 0, 8));
+    EXPECT_FALSE(decoder.Open(file.reader, kOffset, 1, 0, 8, 1, kSide, kSide, false));
+    ASSERT_TRUE(decoder.PrepareJpeg(file.reader, kOffset, 0, 8));
+    EXPECT_FALSE(decoder.Open(file.reader, kOffset, 1, 0, 12, 1, kSide, kSide, false));
+    ASSERT_TRUE(huge.PrepareJpeg(file.reader, kOffset, 0, 8));
+    EXPECT_FALSE(huge.Open(file.reader, kOffset, 0xFFFFFFFF, 0, 8, 1, kSide, kSide, false));
     EXPECT_EQ(huge.bitmaps, nullptr);
-    Bytes other = data;
-    other[2 + 4] = 'X'; // identifier "XITF"
-    DecoderTestFile otherFile(other);
+    data[2 + 4] = 'X'; // identifier "XITF"
+    DataFile otherFile(data);
     CLeadToolLibWrapper otherDecoder;
-    EXPECT_FALSE(otherDecoder.PrepareJpeg(otherFile.reader, kTestDataOffset, 0, 8));
+    EXPECT_FALSE(otherDecoder.PrepareJpeg(otherFile.reader, kOffset, 0, 8));
     EXPECT_EQ(otherDecoder.kind, kNotPrepared);
 }
 
