@@ -21,63 +21,47 @@ bool AllDigits(const uint8_t* field, size_t width)
     return std::all_of(field, field + width, [](uint8_t c) { return c >= '0' && c <= '9'; });
 }
 
-#ifdef VX_MEMORY_FILES
+} // namespace
 
 // The fuzzing build reads through in-memory file calls: the input is
-// published under a fixed name instead of being written to a file.
-std::vector<uint8_t> publishedInput;
-
-} // namespace
-
+// published under a fixed name; the other builds write it to a file
+// removed at exit.
 const std::string& FuzzFilePath()
 {
+#ifdef VX_MEMORY_FILES
     static const std::string path = "fuzz-input";
     return path;
-}
-
-bool WriteFuzzFile(const uint8_t* data, size_t size)
-{
-    publishedInput.assign(data, data + size);
-    memoryfiles::Publish(FuzzFilePath().c_str(), publishedInput.data(), publishedInput.size());
-    return true;
-}
-
 #else
-
-std::string CreateFuzzFile()
-{
-    const char* directory = std::getenv("TMPDIR");
-    std::string pattern = std::string(directory != nullptr ? directory : "/tmp") + "/vx_fuzz_XXXXXX";
-    const int descriptor = mkstemp(pattern.data());
-    if (descriptor < 0)
-        std::abort();
-    close(descriptor);
-    return pattern;
-}
-
-struct FuzzFile {
-    std::string path = CreateFuzzFile();
-    ~FuzzFile() { unlink(path.c_str()); }
-};
-
-} // namespace
-
-const std::string& FuzzFilePath()
-{
-    static const FuzzFile file;
+    static const struct File {
+        std::string path = std::string(std::getenv("TMPDIR") ? std::getenv("TMPDIR") : "/tmp") + "/vx_fuzz_XXXXXX";
+        File()
+        {
+            const int descriptor = mkstemp(path.data());
+            if (descriptor < 0)
+                std::abort();
+            close(descriptor);
+        }
+        ~File() { unlink(path.c_str()); }
+    } file;
     return file.path;
+#endif
 }
 
 bool WriteFuzzFile(const uint8_t* data, size_t size)
 {
+#ifdef VX_MEMORY_FILES
+    static std::vector<uint8_t> published;
+    published.assign(data, data + size);
+    memoryfiles::Publish(FuzzFilePath().c_str(), published.data(), published.size());
+    return true;
+#else
     FILE* stream = std::fopen(FuzzFilePath().c_str(), "wb");
     if (stream == nullptr)
         return false;
     const bool written = std::fwrite(data, 1, size, stream) == size;
     return std::fclose(stream) == 0 && written;
-}
-
 #endif
+}
 
 void DeclareInputLength(uint8_t* data, size_t size)
 {

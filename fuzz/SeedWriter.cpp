@@ -9,7 +9,6 @@
 #include "nitf/NitfImage.h"
 #include "tests/SampleFiles.h"
 #include "tests/fixtures/JpegBlockWriter.h"
-#include "tests/fixtures/LosslessJpegWriter.h"
 #include "tests/fixtures/NitfFileWriter.h"
 
 #include <algorithm>
@@ -48,17 +47,15 @@ void JpegStreams()
 {
     for (int components : {1, 3})
         for (int n = 1; n <= 7; ++n) {
-            LosslessJpegPlan lossless;
-            lossless.components = components;
+            JpegBlockPlan lossless{16, 16, components};
             lossless.predictor = n;
             lossless.pointTransform = n % 3;
             lossless.restartRows = n % 2 ? 4u : 0u;
-            JpegBlockPlan baseline;
-            baseline.components = components;
+            JpegBlockPlan baseline{16, 16, components};
             baseline.defaultQuality = n <= 5 ? n : 0;
             baseline.keepDqt = baseline.keepDht = n > 5;
             const Bytes pattern = TestPattern(16, 16, components, unsigned(n));
-            for (const Bytes& stream : {EncodeLosslessJpeg(pattern, lossless), EncodeJpegBlock(pattern, baseline)}) {
+            for (const Bytes& stream : {EncodeJpegBlock(pattern, lossless), EncodeJpegBlock(pattern, baseline)}) {
                 const Bytes data = BuildNitfJpegData({stream}, NitfApp6Plan{});
                 Write("jpeg", "stream" + std::to_string(written),
                       Prefix({{components == 3, 1}, {0, 1}, {15, 2}, {15, 2}, {1, 1}, {0, 1}}) +

@@ -5,20 +5,11 @@
 #include "tests/fixtures/NitfImageWriter.h"
 #include "tests/fixtures/RpfFrameWriter.h"
 
+#include <malloc.h>
 #include <map>
 
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__) // gcc
-#define VX_SANITIZER_OWNS_MALLOC 1
-#elif defined(__has_feature) // clang
-#if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
-#define VX_SANITIZER_OWNS_MALLOC 1
-#endif
-#endif
-#ifdef VX_SANITIZER_OWNS_MALLOC
-extern "C" size_t __sanitizer_get_current_allocated_bytes(); // gcc ships no header for it
-#else
-#include <malloc.h>
-#endif
+// Defined by the sanitizer runtimes only (gcc ships no header for it).
+extern "C" size_t __sanitizer_get_current_allocated_bytes() __attribute__((weak));
 
 namespace {
 
@@ -30,6 +21,7 @@ std::string AsString(const Bytes& bytes)
     return std::string(bytes.begin(), bytes.end());
 }
 
+// 70 x 90 pixels in 3 x 3 blocks of 32, the edge blocks padded; three bands are R, G, B.
 NitfImagePlan Image(const std::string& IREP, size_t bands, char IMODE, char ICORDS = ' ', const char* IGEOLO = "")
 {
     NitfImagePlan plan;
@@ -42,11 +34,12 @@ NitfImagePlan Image(const std::string& IREP, size_t bands, char IMODE, char ICOR
     plan.bands.assign(bands, NitfBandPlan{});
     for (size_t band = 0; bands == 3 && band < 3; ++band)
         plan.bands[band].IREPBAND = std::string(1, "RGB"[band]);
-    plan.NBPR = plan.NBPC = 3; // the edge blocks padded
+    plan.NBPR = plan.NBPC = 3;
     plan.NPPBH = plan.NPPBV = 32;
     return plan;
 }
 
+// IC "NM" stores every block but each fourth from the second.
 std::string Uncompressed(const NitfImagePlan& plan, unsigned seed)
 {
     const uint64_t values = plan.bands[0].NELUT ? plan.bands[0].NELUT : 1u << (plan.ABPP ? plan.ABPP : plan.NBPP);
@@ -65,7 +58,6 @@ std::string Frame(RpfProduct product, bool bigEndian, std::set<uint32_t> masked)
     RpfFramePlan plan;
     plan.product = product;
     plan.bigEndian = bigEndian;
-    plan.indexImage = PatternIndexImage();
     plan.maskedSubframes = std::move(masked);
     return BuildRpfFrame(plan).bytes;
 }
@@ -82,9 +74,7 @@ std::string Jpeg(int components, unsigned seed, uint32_t streamScale = 1)
     plan.rows = plan.columns = 32;
     plan.NBPR = plan.NBPC = 2;
     plan.NPPBH = plan.NPPBV = 16;
-    JpegBlockPlan block;
-    block.width = block.height = 16 * streamScale;
-    block.components = components;
+    JpegBlockPlan block{16 * streamScale, 16 * streamScale, components};
     std::vector<Bytes> streams;
     for (unsigned i = 0; i < 4; ++i) {
         block.progressive = streamScale > 1 && i >= 2;
@@ -125,13 +115,14 @@ std::vector<SampleFile> FilesOfEveryKind(unsigned seed)
     nitf20.UDID = Tre("TESTXX", "user defined");
     NitfImagePlan masked = Image("MONO", 1, 'B', 'N', kUtmCorners);
     masked.IC = "NM";
+    const std::set<uint32_t> cadrgMasked = {seed % kRpfSubframeCount, 35};
     return {
         {"compressed_jpeg_grey", Jpeg(1, seed)},
         {"compressed_jpeg_colour", Jpeg(3, seed)},
         {"compressed_bilevel_1d", BiLevel(false, seed)},
         {"compressed_bilevel_2d", BiLevel(true, seed)},
-        {"cadrg_big_endian", Frame(RpfProduct::Cadrg, true, {seed % kRpfSubframeCount, 35})},
-        {"cadrg_little_endian", Frame(RpfProduct::Cadrg, false, {seed % kRpfSubframeCount, 35})},
+        {"cadrg_big_endian", Frame(RpfProduct::Cadrg, true, cadrgMasked)},
+        {"cadrg_little_endian", Frame(RpfProduct::Cadrg, false, cadrgMasked)},
         {"cib", Frame(RpfProduct::Cib, true, {7})},
         {"mono_geographic",
          Uncompressed(Image("MONO", 1, 'B', 'G', "324530N0784510W324530N0784400W324415N0784400W324415N0784510W"),
@@ -157,19 +148,18 @@ std::vector<SampleFile> HostileFiles()
     NitfImagePlan plan;
     plan.rows = plan.columns = 8;
     plan.COMRAT = "00.0";
-    plan.IC = "C2"; // parses, never served
-    const std::string dpcm = BuildImageFile(plan, std::string(64, '\0'));
-    plan.IC = "C8"; // not even parsed
-    const std::string jpeg2000 = BuildImageFile(plan, std::string(64, '\0'));
-    plan.IC = "NC";
-    const std::string cut = BuildImageFile(plan, std::string(64, '\0')).substr(0, 300);
+    const auto withIC = [&plan](const char* IC, size_t dataBytes) {
+        plan.IC = IC;
+        return BuildImageFile(plan, std::string(dataBytes, '\0'));
+    };
+    const std::string dpcm = withIC("C2", 64), jpeg2000 = withIC("C8", 64), cut = withIC("NC", 64).substr(0, 300);
     plan.PVTYPE = "R";
     plan.NBPP = 32;
     return {{"rpf_short_colour_table", BuildRpfFrame(shortTable).bytes},
             {"rpf_sections_missing", BuildNitfFile(noSections)},
-            {"dpcm", dpcm},
-            {"jpeg2000", jpeg2000},
-            {"real_pixels", BuildImageFile(plan, std::string(256, '\0'))},
+            {"dpcm", dpcm}, // parses, never served
+            {"jpeg2000", jpeg2000}, // not even parsed
+            {"real_pixels", withIC("NC", 256)},
             {"cut_header", cut},
             {"jpeg_streams_larger_than_blocks", Jpeg(1, 0, 16)}};
 }
@@ -202,9 +192,5 @@ std::string OpenDrawClose(const HandlerExports& rh, const std::string& path, uin
 
 size_t HeapInUse()
 {
-#ifdef VX_SANITIZER_OWNS_MALLOC
-    return __sanitizer_get_current_allocated_bytes();
-#else
-    return mallinfo2().uordblks;
-#endif
+    return __sanitizer_get_current_allocated_bytes ? __sanitizer_get_current_allocated_bytes() : mallinfo2().uordblks;
 }

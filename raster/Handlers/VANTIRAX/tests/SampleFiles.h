@@ -6,9 +6,6 @@
 
 #include "tests/fixtures/HandlerLoader.h"
 
-#include <string>
-#include <vector>
-
 struct SampleFile {
     std::string name, bytes;
 };
@@ -22,14 +19,11 @@ std::vector<SampleFile> FilesOfEveryKind(unsigned seed = 0);
 std::vector<SampleFile> HostileFiles();
 // The bytes of the file of either list with this name.
 const std::string& SampleBytes(const std::string& name);
-
 // One open, draw of full-width rows [0, maxRows) and close, as a line
 // "result R status S failed F size W x H kind K" (failed 0 when not drawn),
 // then the palette's bytes and the rows'.
 std::string OpenDrawClose(const HandlerExports& rh, const std::string& path, uint32_t maxRows);
 // How it begins for a file that opens and draws every row.
 constexpr char kDrawnClean[] = "result 1 status 0 failed 0 ";
-
-// Bytes of heap the process holds: the sanitizer's count in sanitized builds,
-// the C library's otherwise.
+// Bytes of heap the process holds: the sanitizer's count in sanitized builds, the C library's otherwise.
 size_t HeapInUse();
