@@ -1,8 +1,6 @@
-// UTM, MGRS and the Transverse Mercator beneath them, against a table computed
-// by GeoConvert (an exact Transverse Mercator; make_geoconvert_table.py writes
-// it: every latitude band, zones 1 to 60, both hemispheres, MGRS precisions 0
-// to 5, the Norway and Svalbard zones), then what the table does not reach:
-// zone edges, requested zones, limits, letter case, band edges, refusals.
+// UTM, MGRS and the Transverse Mercator beneath them against GeoConvert's table (written by
+// make_geoconvert_table.py: every band, zones 1 to 60 and their edges, MGRS precisions 0 to 5, Norway
+// and Svalbard), then what it does not reach: requested zones, limits, band edges, refusals.
 #include "geo/Angles.h"
 #include "geo/Mgrs.h"
 #include "geo/TransverseMercator.h"
@@ -42,14 +40,9 @@ Grid FromMgrs(const char* reference)
     return g;
 }
 
-// "utm latitude longitude requestedZone" or "mgrs reference", then GeoConvert's status 0, zone,
-// hemisphere, easting and northing (for MGRS the square's south-west corner).
-struct Row {
-    std::string mgrs;
-    double latitude = 0, longitude = 0;
-    int32_t requestedZone = 0;
-    Grid grid;
-};
+// "utm latitude longitude requestedZone" or "mgrs reference", then GeoConvert's zone, hemisphere,
+// easting and northing (for MGRS the square's south-west corner); status 0.
+struct Row { std::string mgrs; double latitude = 0, longitude = 0; int32_t requestedZone = 0; Grid grid; };
 
 std::vector<Row> LoadRows(const std::string& kind)
 {
@@ -68,11 +61,9 @@ std::vector<Row> LoadRows(const std::string& kind)
     return rows;
 }
 
-// Largest differences allowed, in metres, by distance from the central
-// meridian. Measured against the table: 0.054 mm up to 5 degrees (the
-// ellipsoid's semi-minor axis is given to 0.1 mm), then for the inverse
-// 0.30 mm up to 6, 1.1 mm up to 7, 4.8 mm up to 8 and 12.1 mm up to 9
-// degrees; the forward direction stays under 0.25 mm throughout.
+// Largest differences allowed, in metres, by degrees from the central meridian. Measured: 0.054 mm up
+// to 5 (the semi-minor axis is given to 0.1 mm), then for the inverse 0.30 mm up to 6, 1.1 mm up to 7,
+// 4.8 mm up to 8 and 12.1 mm up to 9; the forward direction stays under 0.25 mm throughout.
 double ToleranceAt(double degrees)
 {
     return degrees <= 6 ? 0.001 : degrees <= 7 ? 0.002 : degrees <= 8 ? 0.008 : degrees <= 9 ? 0.020 : 0.0;
@@ -110,15 +101,8 @@ TEST(Mgrs, ConvertsOrRefusesEachReference)
     for (const Row& row : LoadRows("mgrs"))
         EXPECT_EQ(FromMgrs(row.mgrs.c_str()), row.grid) << row.mgrs;
     std::vector<std::pair<const char*, Grid>> cases = {
-        {"31UDQ5248211717", {0, 31, 'N', 452482, 5411717}}, {"56HLH3356847473", {0, 56, 'S', 333568, 6247473}},
-        {"4QFJ1234567890", {0, 4, 'N', 612345, 2367890}}, {"31UDQ52481171", {0, 31, 'N', 452480, 5411710}},
-        {"  4qfj123678", {0, 4, 'N', 612300, 2367800}}, // blanks first, lower case, precision 3
+        {"  4qfj123678", {0, 4, 'N', 612300, 2367800}}, // blanks first
         {"31udq5248211717 trailing", {0, 31, 'N', 452482, 5411717}}, // anything after the digits is ignored
-        {"31UDQ", {0, 31, 'N', 400000, 5400000}}, {"31MEV", {0, 31, 'S', 500000, 9900000}},
-        {"31NEA", {0, 31, 'N', 500000, 0}}, // the hemisphere follows the band
-        // Band U of zone 31 spans northings 5.3 to 6.2 million metres, across
-        // the 2 000 km row cycle: row A there is 6 000 km, not 4 000 km.
-        {"31UDA", {0, 31, 'N', 400000, 6000000}}, {"31UDV", {0, 31, 'N', 400000, 5900000}},
         // 31NDK lies at about 8.1 degrees north, just above band N (0 to 8): the
         // band check allows that much at precision 0, not at precision 5.
         {"31NDK", {0, 31, 'N', 400000, 900000}}, {"31NDK0000000000", {kMgrsRejected, 31, 'N', 400000, 900000}},
@@ -133,8 +117,6 @@ TEST(Mgrs, ConvertsOrRefusesEachReference)
         cases.push_back({refused, {kMgrsRejected, 0, kMgrsNoHemisphere, 0, 0}});
     for (const auto& [reference, grid] : cases)
         EXPECT_EQ(FromMgrs(reference), grid) << reference;
-    for (const char* reference : {"31XEG", "33XWG", "35XNG", "37XEG"})
-        EXPECT_EQ(std::get<0>(FromMgrs(reference)), 0u) << reference;
     // 31NDL at about 9.05 degrees is beyond even the 1-degree tolerance.
     EXPECT_TRUE(std::get<0>(FromMgrs("31NDL")) == kMgrsRejected && std::get<0>(FromMgrs(nullptr)) == kMgrsRejected);
 }
@@ -144,36 +126,32 @@ TEST(TransverseMercator, SetUpComputesSpansOrLeavesTheRecordAndRefusalsWriteNoth
     TransverseMercatorParams params;
     ASSERT_EQ(SetTransverseMercatorParams(params, kA, kB, 0.0, DegreesToRadians(357.0), 0.0, 0.0, 1.0), 0u);
     EXPECT_NEAR(params.lambda0, DegreesToRadians(-3.0), 1e-15); // 357 degrees east is 3 west
-    EXPECT_NEAR(params.dN, 10001966.0, 1.0);                    // the spans the inverse is held to
-    EXPECT_NEAR(params.dE, 18577794.0, 1.0);
+    EXPECT_TRUE(std::fabs(params.dN - 10001966.0) < 1 && std::fabs(params.dE - 18577794.0) < 1); // the inverse's spans
     struct Case { double a, b, phi0, lambda0, k0; uint32_t status; };
     for (const Case& c : {Case{0.0, kB, 0, 0, 1, kTmSemiMajorAxisError | kTmAxisOrderError},
-                          Case{kA, -1.0, 0, 0, 1, kTmSemiMinorAxisError}, Case{NAN, kB, 0, 0, 1, kTmSemiMajorAxisError},
-                          Case{kA, kB, 1.6, -3.2, 1, kTmOriginLatitudeError | kTmCentralMeridianError},
-                          Case{kA, kB, 0, 6.3, 3.1, kTmCentralMeridianError | kTmScaleFactorError}}) {
+                          {kA, -1.0, 0, 0, 1, kTmSemiMinorAxisError}, {NAN, kB, 0, 0, 1, kTmSemiMajorAxisError},
+                          {kA, kB, 1.6, -3.2, 1, kTmOriginLatitudeError | kTmCentralMeridianError},
+                          {kA, kB, 0, 6.3, 3.1, kTmCentralMeridianError | kTmScaleFactorError}}) {
         TransverseMercatorParams unchanged;
         unchanged.FE = 123.0;
-        EXPECT_EQ(SetTransverseMercatorParams(unchanged, c.a, c.b, c.phi0, c.lambda0, 0, 0, c.k0), c.status);
-        EXPECT_EQ(unchanged.FE, 123.0);
+        EXPECT_TRUE(SetTransverseMercatorParams(unchanged, c.a, c.b, c.phi0, c.lambda0, 0, 0, c.k0) == c.status &&
+                    unchanged.FE == 123.0) << c.a << " " << c.b << " " << c.lambda0;
     }
     double x = kUnset, y = kUnset; // refusals write nothing; the distortion warning does
     EXPECT_EQ(TransverseMercatorForward(params, 1.6, 2.0, x, y), kTmLatitudeError | kTmLongitudeError);
     EXPECT_EQ(TransverseMercatorForward(params, NAN, 0.0, x, y), kTmLatitudeError);
     EXPECT_EQ(TransverseMercatorInverse(params, 4.1e7, -4.1e7, x, y), kTmEastingError | kTmNorthingError);
     EXPECT_EQ(x + y, 2 * kUnset);
-    EXPECT_EQ(TransverseMercatorForward(TransverseMercatorParams(), 0.5, DegreesToRadians(10.0), x, y),
+    EXPECT_EQ(TransverseMercatorForward(TransverseMercatorParams(), 0.5, DegreesToRadians(10), x, y),
               kTmDistortionWarning);
     EXPECT_GT(x, 0.0);
 }
 
-// Zone choice at its edges (inside southern Norway and Svalbard the GeoConvert rows judge it)
-// and requested zones: only neighbours, and zone 60 has no zone 61 beside it.
+// Requested zones (only neighbours; zone 60 has none called 61) and the latitude limits.
 TEST(Utm, ZoneRulesAndRefusedPoints)
 {
     struct Case { double latitude, longitude; int32_t requested, zone; uint32_t status; };
-    for (const Case& c : {Case{10, -180, 0, 1, 0}, {10, 180, 0, 1, 0}, {10, 179.9, 0, 60, 0}, {10, 360, 0, 31, 0},
-                          {10, -0.1, 0, 30, 0}, {64, 5, 0, 31, 0}, {75, 9, 0, 33, 0}, {75, 42, 0, 38, 0},
-                          {10, 3, 30, 30, 0}, {10, 3, 32, 32, 0}, {10, -177, 60, 60, 0}, {10, 177, 1, 1, 0},
+    for (const Case& c : {Case{10, 3, 30, 30, 0}, {10, 3, 32, 32, 0}, {10, -177, 60, 60, 0}, {10, 177, 1, 1, 0},
                           {84.49, 3, 0, 31, 0}, {-80.49, 3, 0, 31, 0}, {10, 3, 33, 0, kUtmZoneOverrideError},
                           {10, 3, -1, 0, kUtmZoneOverrideError}, {10, 177, 61, 0, kUtmZoneOverrideError},
                           {84.6, 3, 0, 0, kUtmLatitudeError}, {-80.6, 3, 0, 0, kUtmLatitudeError},
@@ -187,10 +165,9 @@ TEST(Utm, ZoneRulesAndRefusedPoints)
 
 TEST(Utm, HemispheresGridLimitsAndTheInverse)
 {
-    const Grid equator = ToUtm(0.0, 3.0), south = ToUtm(-1e-6, 3.0), west = ToUtm(0.5, -1.0, 31);
-    EXPECT_TRUE(std::get<2>(equator) == 'N' && std::get<4>(equator) == 0.0 && std::get<2>(south) == 'S');
-    EXPECT_TRUE(std::get<4>(south) > 9999999.0 && std::get<4>(south) < 10000000.0) << std::get<4>(south);
+    EXPECT_EQ(std::get<4>(ToUtm(0.0, 3.0)), 0.0); // exactly; its hemisphere and just south are GeoConvert rows
     // Four degrees west of zone 31's meridian: about 55 km, still written.
+    const Grid west = ToUtm(0.5, -1.0, 31);
     EXPECT_TRUE(std::get<0>(west) == kUtmEastingError && std::fabs(std::get<3>(west) - 55000.0) < 1000.0);
     double latitude = kUnset, longitude = kUnset;
     EXPECT_EQ(UtmToGeodetic(31, 'N', 99999.0, 1000.0, kA, kB, latitude, longitude), kUtmEastingError);

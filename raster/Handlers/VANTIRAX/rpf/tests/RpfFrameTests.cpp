@@ -1,6 +1,5 @@
-// The frame reader: written frames decode to the index image they came from and, like corpus frames,
-// to GDAL's indices, colours and corners (masked subframes are 216 in both: GDAL's no-data, black
-// there, white here); hostile frames give a refused open or failed lines, never a read out of bounds.
+// Written frames decode to their index image and, like corpus frames, to GDAL's indices, colours and corners
+// (masked: 216, GDAL's no-data, black there, white here); hostile frames never read out of bounds.
 #include "base/FileReader.h"
 #include "rpf/RpfFrameReader.h"
 #include "tests/GdalPeer.h"
@@ -20,9 +19,8 @@
 
 namespace {
 
-// A frame written to a temporary file, opened and drawn through two CFileReaders as the RPF branch
-// does: Line gives columns first..last of a row in a draw of that width, All every row in one draw;
-// both are empty when a line fails.
+// A frame in a temporary file, opened and drawn through two CFileReaders as the RPF branch does: Line gives
+// columns first..last of a row in a draw of that width, All every row in one draw; empty when a line fails.
 struct OpenedFrame {
     OpenedFrame(const std::string& bytes, uint32_t headerSection) : file(bytes, ".ntf")
     {
@@ -72,9 +70,8 @@ TEST(RpfBadInput, RefusedAtOpenOrOnlyTheLinesTheDamageMeets)
     const auto Bits = [](double value) { uint64_t bits = 0; std::memcpy(&bits, &value, 8); return bits; };
     const auto Lookup = [](uint32_t table, uint32_t field) { return 6 + table * 14 + field; }; // after the header
     const std::vector<Line> codeRowFails = {{0, 0, 1535, false}, {0, 260, 270, false}};
-    auto display = &L::displayParameters, image = &L::imageDescription, location = &L::locationSection,
-         corners = &L::coverage, lookup = &L::lookupSubsection, compression = &L::compressionSubheader,
-         colormap = &L::colormapSubsection;
+    auto display = &L::displayParameters, image = &L::imageDescription, corners = &L::coverage;
+    auto location = &L::locationSection, lookup = &L::lookupSubsection, codec = &L::compressionSubheader;
     std::vector<Edit> sharing; // 4 lookup records sharing a table of 60000
     for (uint32_t table = 0; table < 4; ++table)
         sharing.insert(sharing.end(), {{lookup, Lookup(table, 2), 60000, 4}, {lookup, Lookup(table, 10), 62, 4}});
@@ -86,8 +83,7 @@ TEST(RpfBadInput, RefusedAtOpenOrOnlyTheLinesTheDamageMeets)
         {"cut", {}, false, {}, {}, at.lookupSubsection + 40000},
         {"cut in the third subframe", {}, true, {{0, 0, 767, true}, {30, 0, 767, false}, {0, 0, 1535, false},
          {1, 0, 511, true}}, {}, at.spatialData + 2 * kRpfSubframeBytes + 500},
-        // Spans in a code, across codes and subframes, one column, whole rows, in masked subframe 3;
-        // spans outside the frame or reversed are refused.
+        // Spans in a code, across codes and subframes, whole rows, in masked subframe 3; outside or reversed.
         {"undamaged", {}, true, {{5, 1, 10, true}, {6, 2, 2, true}, {7, 3, 4, true}, {8, 0, 3, true},
           {255, 250, 262, true}, {256, 255, 256, true}, {1535, 0, 1535, true}, {1000, 1535, 1535, true},
           {77, 511, 1029, true}, {9, 600, 1100, true}, {3, 780, 790, true}, {1536, 0, 10, false},
@@ -102,17 +98,14 @@ TEST(RpfBadInput, RefusedAtOpenOrOnlyTheLinesTheDamageMeets)
         // No location records: the coverage is read from offset 0, where "NITF" is no latitude.
         {"65535 location records", {{location, 6, 0xFFFF, 2}}, false}, {"none", {{location, 6, 0, 2}}, false},
         {"2^28 lookup records", {{lookup, Lookup(0, 2), 0x10000000, 4}}, false}, {"sharing", sharing, false},
-        {"65535 lookup offset records", {{compression, 2, 0xFFFF, 2}}, false},
-        {"2^31 colour records", {{colormap, 6 + 2, 0x7FFFFFFF, 4}}, false},
-        {"compression algorithm 0", {{compression, 0, 0, 2}}, false}, {"3", {{compression, 0, 3, 2}}, false},
-        {"compression parameter records", {{compression, 4, 1, 2}}, false},
-        {"lookup record length 13", {{lookup, 4, 13, 2}}, false}, {"colour 16", {{colormap, 4, 16, 2}}, false},
+        {"65535 offsets", {{codec, 2, 0xFFFF, 2}}, false}, {"compression algorithm 0", {{codec, 0, 0, 2}}, false},
+        {"2^31 colours", {{&L::colormapSubsection, 8, 0x7FFFFFFF, 4}}, false}, {"3", {{codec, 0, 3, 2}}, false},
+        {"parameter records", {{codec, 4, 1, 2}}, false}, {"0-bit codes", {{display, 8, 0, 1}}, true, codeRowFails},
+        {"lookup length 13", {{lookup, 4, 13, 2}}, false}, {"colour 16", {{&L::colormapSubsection, 4, 16, 2}}, false},
         {"latitude 90", {{corners, 0, Bits(90.0), 8}}, true}, {"longitude -180", {{corners, 8, Bits(-180.0), 8}}, true},
-        {"latitude 90.000001", {{corners, 0, Bits(90.000001), 8}}, false},
-        {"longitude NaN", {{corners, 56, Bits(std::nan("")), 8}}, false},
+        {"latitude > 90", {{corners, 0, Bits(90.000001), 8}}, false}, {"NaN", {{corners, 56, Bits(NAN), 8}}, false},
         {"a resolution is no corner", {{corners, 64, Bits(1e9), 8}}, true},
         {"11-bit codes", {{display, 8, 11, 1}}, true, codeRowFails}, {"16", {{display, 8, 16, 1}}, true, codeRowFails},
-        {"0-bit codes", {{display, 8, 0, 1}}, true, codeRowFails},
         // Lookup records of 2 values decode (columns 2 and 3 of each code on rows 4k + 1 masked);
         // of 8 values, or of 16-bit values, no line of their kernel row.
         {"2 values a record", {{lookup, Lookup(1, 6), 2, 2}}, true, {{6, 0, 1535, true}}, [](OpenedFrame& opened) {
@@ -127,8 +120,8 @@ TEST(RpfBadInput, RefusedAtOpenOrOnlyTheLinesTheDamageMeets)
          {{0, 768, 1000, true}, {0, 0, 10, false}}},
         {"subframe 4 outside the file", {{&L::maskSubsection, 6 + 4 * 4, 0x7FFFFF00, 4}}, true,
          {{10, 0, 1535, false}, {10, 0, 1023, true}, {11, 1024, 1100, false}, {300, 0, 1535, true}}},
-        {"no lookup offset records", {{compression, 2, 0, 2}}, true, {{0, 0, 1535, false}}},
-        {"the second compression algorithm", {{compression, 0, 2, 2}}, true,
+        {"no lookup offset records", {{codec, 2, 0, 2}}, true, {{0, 0, 1535, false}}},
+        {"the second compression algorithm", {{codec, 0, 2, 2}}, true,
          {{0, 0, 1535, true}, {801, 3, 1535, true}, {1535, 0, 1535, true}}},
         {"no colour tables", {{&L::colorGraySubheader, 0, 0, 1}}, true, {{0, 0, 1535, true}}, [](OpenedFrame& opened) {
              uint8_t grey = 0;
@@ -160,8 +153,7 @@ TEST(RpfBadInput, RefusedAtOpenOrOnlyTheLinesTheDamageMeets)
             c.alsoCheck(opened);
     }
     EXPECT_FALSE(OpenedFrame(frame.bytes, fileSize + 100).opened);
-    // Draws as wide as a host may ask (the code buffer holds no more than a frame row's codes); a
-    // span wider than the draw was prepared for is refused, not overrun.
+    // Draws as wide as a host may ask: a frame row's codes at most; a span wider than the draw: refused.
     OpenedFrame whole(frame);
     CRpfFrameReader& reader = whole.reader;
     std::vector<uint8_t> line(kRpfFrameSide + 1);
@@ -174,9 +166,8 @@ TEST(RpfBadInput, RefusedAtOpenOrOnlyTheLinesTheDamageMeets)
     EXPECT_FALSE(reader.ReadLine(whole.drawReader, 0, 0, 100, line.data()));
     reader.ReleaseCodeBuffer();
     EXPECT_FALSE(reader.ReadLine(whole.drawReader, 0, 0, 3, line.data()));
-    // A little-endian frame is held to the same ranges.
+    // A little-endian frame (opened by RpfFrames.WrittenFrames*) is held to the same ranges.
     RpfFrame little = BuildRpfFrame(RpfFramePlan{RpfProduct::Cib, false, {}, {}, {}, {}});
-    EXPECT_TRUE(OpenedFrame(little).opened);
     PatchRpfNumber(little, little.layout.coverage + 40, Bits(200.0), 8);
     EXPECT_FALSE(OpenedFrame(little).opened);
 }
