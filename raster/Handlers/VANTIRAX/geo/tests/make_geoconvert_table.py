@@ -85,6 +85,22 @@ def sample_points():
     return points
 
 
+# Zone and hemisphere edges: the 180 degree meridian from either side and
+# beyond 360, the Greenwich meridian, the northern edge of southern Norway,
+# Svalbard's zone boundaries at 9 and 42 degrees, the equator and just south.
+EDGE_POINTS = [(10.0, -180.0, 0), (10.0, 180.0, 0), (10.0, 179.9, 0), (10.0, 360.0, 0),
+               (10.0, -0.1, 0), (64.0, 5.0, 0), (75.0, 9.0, 0), (75.0, 42.0, 0),
+               (0.0, 3.0, 0), (-0.000001, 3.0, 0)]
+
+# References beside the sampled ones: both hemispheres, odd precisions and
+# precision 0, the hemisphere following the band (31NEA, 31MEV), band U of
+# zone 31 across the 2 000 km row cycle (31UDA is 6 000 km, not 4 000 km),
+# lower case, and Svalbard's zones 31, 33, 35 and 37 in band X.
+EXTRA_REFERENCES = ["31UDQ5248211717", "56HLH3356847473", "4QFJ1234567890", "31UDQ52481171",
+                    "4qfj123678", "31UDQ", "31NEA", "31MEV", "31UDA", "31UDV",
+                    "31XEG", "33XWG", "35XNG", "37XEG"]
+
+
 def utm_rows(points):
     rows = []
     for requested in sorted({p[2] for p in points}):
@@ -109,6 +125,7 @@ def mgrs_rows(points):
         references = geoconvert(["-m", "-p", str(precision - 5)],
                                 ["%.6f %.6f" % (lat, lon) for lat, lon, _ in chosen])
         references = [r for r in references if r is not None]
+        references += [r for r in EXTRA_REFERENCES if len(r.lstrip("0123456789")) == 3 + 2 * precision]
         centres = geoconvert(["-u", "-p", "4"], references)
         half = 0.5 * 10 ** (5 - precision)
         for reference, centre in zip(references, centres):
@@ -126,7 +143,7 @@ def mgrs_rows(points):
 
 
 def main():
-    points = sample_points()
+    points = sample_points() + EDGE_POINTS
     version = subprocess.run(["GeoConvert", "--version"], capture_output=True,
                              text=True).stdout.strip()
     with open(OUTPUT, "w") as table:

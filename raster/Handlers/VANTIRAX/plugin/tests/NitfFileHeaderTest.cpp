@@ -1,126 +1,115 @@
+// What every open reads first: the file reader, the decimal fields and the NITF file header.
 #include "base/FieldNumbers.h"
+#include "base/FileReader.h"
 #include "nitf/NitfFileHeader.h"
 #include "tests/fixtures/NitfFileWriter.h"
 #include "tests/fixtures/TempFiles.h"
 
 #include <gtest/gtest.h>
 
+#include <cstring>
 #include <string>
 
 namespace {
 
-// A file written to a temporary path with its header parsed.
-struct ParsedHeader {
-    explicit ParsedHeader(const std::string& bytes) : file(bytes, ".ntf")
-    {
-        header.SetPath(file.c_str());
-        parsed = header.Parse();
-    }
-    TempFile file;
-    CNitfFileHeader header;
-    bool parsed = false;
-};
-
-NitfFilePlan OneImage(bool version21 = true)
+bool Parses(const std::string& bytes, CNitfFileHeader* parsed = nullptr)
 {
-    NitfFilePlan plan;
-    plan.version21 = version21;
-    plan.images.push_back({std::string(300, 'S'), std::string(1000, 'D')});
-    return plan;
+    CNitfFileHeader local;
+    CNitfFileHeader& header = parsed ? *parsed : local;
+    const TempFile file(bytes, ".ntf");
+    header.SetPath(file.c_str());
+    return header.Parse();
+}
+
+TEST(FileReader, ReadsSeeksItsTwoStickyFlagsAndRefusedPaths)
+{
+    CFileReader reader;
+    char buffer[10] = {'a', 'b', 'c', 'd'};
+    reader.ReadBytes(buffer, 4); // no file: buffer and fields alone
+    EXPECT_TRUE(std::memcmp(buffer, "abcd", 4) == 0 && reader.handle == kNoFile && reader.Failed() &&
+                reader.position + reader.endOfFile == 0);
+    TempFile path("0123456789", ".bin");
+    reader.OpenFile(path.c_str(), kShareDenyWrite);
+    ASSERT_TRUE(reader.HoldsFile() && reader.FileSize() == 10u);
+    reader.SeekTo(6, kSeekSet);
+    reader.ReadBytes(buffer, 10); // a short read sets end of file and advances by what was read
+    EXPECT_TRUE(reader.endOfFile == 1 && reader.position == 10u && std::memcmp(buffer, "6789", 4) == 0);
+    reader.OpenFile(path.c_str(), kShareDenyWrite); // opening again clears every field
+    EXPECT_FALSE(reader.Failed());
+    reader.SeekTo(-5, kSeekSet); // a failed seek sticks: later seeks and reads do nothing
+    reader.SeekTo(0, kSeekSet);
+    reader.ReadBytes(buffer, 2);
+    EXPECT_TRUE(reader.error == kSeekFailed && buffer[0] == '6');
+    reader.OpenFile(path.c_str(), kShareDenyWrite);
+    EXPECT_TRUE(reader.error == 0 && reader.position == 0u);
+    reader.ReadBytes(buffer, 2);
+    EXPECT_TRUE(std::memcmp(buffer, "01", 2) == 0 && !reader.Failed());
+    // A path of kReaderPathSize characters leaves no room for the terminator.
+    const std::string overlong = "/tmp/" + std::string(kReaderPathSize - 5, 'a');
+    for (const char* refused : {overlong.c_str(), "/nonexistent/file.ntf", static_cast<const char*>(nullptr)}) {
+        reader.OpenFile(refused, kShareDenyWrite); // and the file open before is closed
+        EXPECT_TRUE(reader.handle == kNoFile && reader.path[0] == '\0');
+    }
 }
 
 TEST(FieldNumbers, ConvertLikeAtolWithinWidth)
 {
-    EXPECT_EQ(FieldToLong("00123", 5), 123);
-    EXPECT_EQ(FieldToLong("  -42xyz", 8), -42);
-    EXPECT_EQ(FieldToLong("12345", 3), 123);
-    EXPECT_EQ(FieldToLong("abc", 3), 0);
-    EXPECT_EQ(FieldToLong("1234567890123456", 16), 0);
-    EXPECT_EQ(FieldToLong("99999999999", 11), 0); // out of 32-bit range
-    EXPECT_DOUBLE_EQ(FieldToDouble("+12.5000", 8), 12.5);
-    EXPECT_DOUBLE_EQ(FieldToDouble("-0.25E", 5), -0.25);
-    EXPECT_DOUBLE_EQ(FieldToDouble(std::string(32, '1').c_str(), 32), 0.0);
+    // The last two are 16 characters wide and out of 32-bit range.
+    for (const auto& [text, width, value] : {std::tuple{"00123", 5u, 123}, {"  -42xyz", 8u, -42}, {"12345", 3u, 123},
+                                             {"abc", 3u, 0}, {"1234567890123456", 16u, 0}, {"99999999999", 11u, 0}})
+        EXPECT_EQ(FieldToLong(text, width), value) << text;
+    for (const auto& [text, width, value] : {std::tuple{"+12.5000", 8u, 12.5}, {"-0.25E", 5u, -0.25},
+                                             {"11111111111111111111111111111111", 32u, 0.0}})
+        EXPECT_DOUBLE_EQ(FieldToDouble(text, width), value) << text;
 }
 
-// Both versions with and without a downgrade event, every segment group,
-// extended header data: the image segments are where the header says.
-TEST(NitfFileHeader, SegmentGroupsOfBothVersions)
+// Both versions with and without a downgrade event, every segment group and extended header
+// data: the image segments are where the header says. An RPF header is user-defined header data
+// of exactly 62 bytes (RPFHDR data of 48), tag in either case; userHeaderOffset + 14 is its first byte.
+TEST(NitfFileHeader, SegmentGroupsOfBothVersionsAndTheRpfHeader)
 {
-    for (bool version21 : {true, false})
-        for (bool event : {false, true}) {
-            NitfFilePlan plan = OneImage(version21);
-            plan.downgradeEvent = event;
-            plan.images.push_back({"ab", "cdef"});
-            plan.graphics.push_back({std::string(258, 'g'), "graphic"});
-            plan.labels.push_back({std::string(320, 'l'), "label"});
-            plan.texts.push_back({std::string(282, 't'), "hello"});
-            plan.dataExtensions.push_back({std::string(200, 'd'), "des"});
-            plan.reservedExtensions.push_back({std::string(200, 'r'), "res"});
-            plan.extendedHeaderData = Tre("XTRA01", "xyz");
-            ParsedHeader file(BuildNitfFile(plan));
-            ASSERT_TRUE(file.parsed) << version21 << event;
-            const CNitfFileHeader& h = file.header;
-            EXPECT_EQ(h.version21, version21 ? 1 : 0);
-            EXPECT_EQ(h.fixedLayout, event && !version21 ? 0 : 1);
-            EXPECT_EQ(h.HL, NitfHeaderLength(plan));
-            ASSERT_EQ(h.NUMI, 2);
-            EXPECT_EQ(h.imageSegments[0].subheaderLength, 300u);
-            EXPECT_EQ(h.imageSegments[0].dataLength, 1000u);
-            EXPECT_EQ(h.imageSegments[1].subheaderLength + h.imageSegments[1].dataLength, 6u);
-            EXPECT_EQ(std::vector<int>({h.NUMS, h.NUML, h.NUMT, h.NUMDES, h.NUMRES}), std::vector<int>(5, 1));
-            EXPECT_EQ(h.UDHDL, 0);
-            EXPECT_EQ(h.userHeaderOffset, kNoUserHeader);
-            EXPECT_EQ(h.XHDL, 3 + 11 + 3);
-            ASSERT_NE(h.XHD, nullptr);
-            EXPECT_EQ(std::string(reinterpret_cast<char*>(h.XHD), 6), "XTRA01");
-        }
-    ParsedHeader none(BuildNitfFile(NitfFilePlan{})); // no segments at all still parses
-    ASSERT_TRUE(none.parsed);
-    EXPECT_EQ(none.header.NUMI, 0);
-    EXPECT_EQ(none.header.imageSegments, nullptr);
-}
-
-// An RPF header is user-defined header data of exactly 62 bytes (an RPFHDR
-// extension of 48), tag in either case; userHeaderOffset + 14 is its first byte.
-TEST(NitfFileHeader, RpfHeaderRecognisedOnlyWithLength62)
-{
-    NitfFilePlan plan = OneImage();
-    for (const auto& [tag, dataLength, rpf] : {std::tuple{"RPFHDR", 48, true}, {"rpfhdr", 48, true},
-                                               {"RPFHDR", 49, false}, {"RPFHDR", 47, false}}) {
-        plan.userHeaderData = Tre(tag, std::string(size_t(dataLength), '\0'));
+    struct Case { bool version21, event; const char* tag; int dataLength; bool rpf; };
+    for (const Case& c : {Case{true, false, "RPFHDR", 48, true}, {true, true, "rpfhdr", 48, true},
+                          {false, false, "RPFHDR", 49, false}, {false, true, "RPFHDR", 47, false}}) {
+        const NitfFilePlan plan{c.version21, c.event, {{std::string(300, 'S'), std::string(1000, 'D')}, {"ab", "cdef"}},
+                                {{std::string(258, 'g'), "graphic"}}, {{std::string(320, 'l'), "label"}},
+                                {{std::string(282, 't'), "hello"}}, {{std::string(200, 'd'), "des"}},
+                                {{std::string(200, 'r'), "res"}}, Tre(c.tag, std::string(size_t(c.dataLength), '\0')),
+                                Tre("XTRA01", "xyz"), -1, -1};
         const std::string bytes = BuildNitfFile(plan);
-        ParsedHeader file(bytes);
-        ASSERT_TRUE(file.parsed);
-        EXPECT_EQ(file.header.UDHDL, 14 + dataLength);
-        EXPECT_EQ(file.header.HasRpfHeader(), rpf) << tag << dataLength;
-        EXPECT_EQ(bytes.substr(file.header.userHeaderOffset, 9), "000" + std::string(tag));
+        CNitfFileHeader h;
+        ASSERT_TRUE(Parses(bytes, &h)) << c.version21 << c.event;
+        EXPECT_EQ(std::vector<int64_t>({h.version21, h.fixedLayout, h.HL, h.NUMI, h.NUMS, h.NUML, h.NUMT, h.NUMDES,
+                                        h.NUMRES, h.UDHDL, h.XHDL, h.HasRpfHeader()}),
+                  std::vector<int64_t>({c.version21, c.event && !c.version21 ? 0 : 1, NitfHeaderLength(plan), 2, 1, 1,
+                                        1, 1, 1, 14 + c.dataLength, 3 + 11 + 3, c.rpf}));
+        ASSERT_TRUE(h.imageSegments != nullptr && h.XHD != nullptr);
+        EXPECT_EQ(h.imageSegments[0].subheaderLength * 10000 + h.imageSegments[0].dataLength, 300u * 10000 + 1000);
+        EXPECT_EQ(h.imageSegments[1].subheaderLength + h.imageSegments[1].dataLength, 6u);
+        EXPECT_EQ(bytes.substr(h.userHeaderOffset, 9), "000" + std::string(c.tag));
+        EXPECT_EQ(std::string(reinterpret_cast<char*>(h.XHD), 6), "XTRA01");
     }
+    CNitfFileHeader none; // no segments at all still parses
+    ASSERT_TRUE(Parses(BuildNitfFile(NitfFilePlan{}), &none));
+    EXPECT_TRUE(none.NUMI == 0 && none.imageSegments == nullptr && none.userHeaderOffset == kNoUserHeader);
 }
 
 TEST(NitfFileHeader, RefusesWrongVersionsAndLengthsThatLie)
 {
-    const std::string good = BuildNitfFile(OneImage());
-    for (const char* version : {"NITF02.01", "NITF01.10", "NSIF01.00", "NITF03.00"})
-        EXPECT_FALSE(ParsedHeader(std::string(version) + good.substr(9)).parsed) << version;
-    EXPECT_FALSE(ParsedHeader(good.substr(0, good.size() - 1)).parsed); // FL larger than the file
-    EXPECT_FALSE(ParsedHeader(good + "x").parsed);                       // FL smaller than the file
-    EXPECT_FALSE(ParsedHeader("").parsed);
-    EXPECT_FALSE(ParsedHeader("NITF02.10").parsed);
-    // A segment count running past the end of the file whose FL still matches, or not a number.
-    for (const char* count : {"999", "-1x"})
-        EXPECT_FALSE(ParsedHeader(good.substr(0, 360) + count + good.substr(363)).parsed) << count;
-    // UDHDL of 1 or 2 (a negative data size) or past the end of the file; XHDL 2.
-    struct Lie {
-        int64_t userHeader, extendedHeader;
+    const auto declaring = [](int64_t udhdl, int64_t xhdl) { // -1: the true length
+        return BuildNitfFile({true, false, {{std::string(300, 'S'), std::string(1000, 'D')}}, {}, {}, {}, {}, {},
+                              Tre("ABCDEF", "x"), xhdl < 0 ? "" : "x", udhdl, xhdl});
     };
-    for (const Lie& lie : {Lie{1, -1}, {2, -1}, {99999, -1}, {-1, 2}}) {
-        NitfFilePlan plan = OneImage();
-        plan.userHeaderData = Tre("ABCDEF", "x");
-        plan.extendedHeaderData = lie.extendedHeader < 0 ? "" : "x";
-        plan.declaredUserHeaderLength = lie.userHeader;
-        plan.declaredExtendedHeaderLength = lie.extendedHeader;
-        EXPECT_FALSE(ParsedHeader(BuildNitfFile(plan)).parsed) << lie.userHeader << " " << lie.extendedHeader;
-    }
+    const std::string good = declaring(-1, -1), rest = good.substr(9);
+    // Other versions; FL larger or smaller than the file; a segment count running past the end
+    // of the file whose FL still matches, or not a number; UDHDL of 1 or 2 (a negative data
+    // size) or past the end of the file; XHDL 2.
+    for (const std::string& bad : {"NITF02.01" + rest, "NITF01.10" + rest, "NSIF01.00" + rest, "NITF03.00" + rest,
+                                   good.substr(0, good.size() - 1), good + "x", std::string(), std::string("NITF02.10"),
+                                   good.substr(0, 360) + "999" + good.substr(363),
+                                   good.substr(0, 360) + "-1x" + good.substr(363), declaring(1, -1), declaring(2, -1),
+                                   declaring(99999, -1), declaring(-1, 2)})
+        EXPECT_FALSE(Parses(bad)) << bad.substr(0, 9) << " " << bad.size();
 }
 
 } // namespace
