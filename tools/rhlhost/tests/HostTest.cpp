@@ -256,8 +256,8 @@ TEST(HostBatch, ProgressBarOnATerminal)
         command += arg + " ";
     // script(1) gives the host a terminal and copies what it shows to stdout.
     const std::string shown = RunProgram({"script", "-qec", command, "/dev/null"}).out;
-    for (const char* part : {"] 5/5 files ", " files/s ", " left", "5 files: 5 rendered"})
-        EXPECT_NE(shown.find(part), std::string::npos) << shown;
+    for (const char* piece : {"] 5/5 files ", " files/s ", " left", "5 files: 5 rendered"})
+        EXPECT_NE(shown.find(piece), std::string::npos) << shown;
 }
 
 // Each frame opens its own handle and releases it: the host's peak memory
