@@ -14,20 +14,18 @@
 
 namespace {
 
-constexpr unsigned kThreads = 8, kRounds = 5;
-constexpr uint32_t kRowsPerDraw = 96;
-
 TEST(Concurrency, EightThreadsDrawTheirOwnFilesOfEveryKindAsOneThreadDoes)
 {
+    constexpr unsigned kThreads = 8, kRounds = 5;
+    constexpr uint32_t kRowsPerDraw = 96;
     const HandlerExports& rh = LoadHandler(VX_HANDLER_PATH);
     TempDirectory directory;
-    std::vector<std::vector<std::string>> paths(kThreads);
+    std::vector<std::vector<std::string>> paths(kThreads), drawn(kThreads); // drawn: rounds x files per thread
     for (unsigned t = 0; t < kThreads; ++t)
         for (const SampleFile& file : FilesOfEveryKind(t)) {
             paths[t].push_back(directory / (file.name + std::to_string(t) + ".ntf"));
             WriteFile(paths[t].back(), file.bytes);
         }
-    std::vector<std::vector<std::string>> results(kThreads); // per thread: rounds x files
     std::atomic<unsigned> arrived{0};
     std::vector<std::thread> threads;
     for (unsigned t = 0; t < kThreads; ++t)
@@ -36,17 +34,16 @@ TEST(Concurrency, EightThreadsDrawTheirOwnFilesOfEveryKindAsOneThreadDoes)
                 std::this_thread::yield();
             for (unsigned round = 0; round < kRounds; ++round)
                 for (const std::string& path : paths[t])
-                    results[t].push_back(OpenDrawClose(rh, path, kRowsPerDraw));
+                    drawn[t].push_back(OpenDrawClose(rh, path, kRowsPerDraw));
         });
     for (std::thread& thread : threads)
         thread.join();
-
     for (unsigned t = 0; t < kThreads; ++t)
         for (size_t f = 0; f < paths[t].size(); ++f) {
             const std::string alone = OpenDrawClose(rh, paths[t][f], kRowsPerDraw);
             EXPECT_EQ(alone.rfind(kDrawnClean, 0), 0u) << paths[t][f];
             for (unsigned round = 0; round < kRounds; ++round)
-                EXPECT_TRUE(results[t][round * paths[t].size() + f] == alone) << paths[t][f] << " round " << round;
+                EXPECT_TRUE(drawn[t][round * paths[t].size() + f] == alone) << paths[t][f] << " round " << round;
         }
 }
 

@@ -6,59 +6,57 @@
 
 #include <regex>
 
-namespace {
-
-const std::string kNumber = "\\s*([-+0-9.eE]+)\\s*";
-
-std::vector<std::smatch> AllMatches(const std::string& text, const std::string& pattern)
+std::vector<std::vector<double>> NumbersIn(const std::string& text, const std::string& pattern)
 {
-    std::vector<std::smatch> matches;
+    std::vector<std::vector<double>> found;
     const std::regex expression(pattern);
-    for (std::sregex_iterator it(text.begin(), text.end(), expression), end; it != end; ++it)
-        matches.push_back(*it);
-    return matches;
+    for (std::sregex_iterator it(text.begin(), text.end(), expression), end; it != end; ++it) {
+        found.emplace_back();
+        for (size_t group = 1; group < it->size(); ++group)
+            found.back().push_back(std::stod((*it)[group]));
+    }
+    return found;
 }
-
-} // namespace
 
 GdalReport ReadWithGdal(const std::string& path)
 {
     GdalReport report;
     int status = 0;
     const std::string json = RunCommand("gdalinfo -json -checksum '" + path + "'", &status);
-    std::smatch m;
-    if (status != 0 || !std::regex_search(json, m, std::regex("\"size\":\\s*\\[\\s*(\\d+),\\s*(\\d+)")))
+    const std::string n = "\\s*([-+0-9.eE]+)\\s*";
+    const auto size = NumbersIn(json, "\"size\":\\s*\\[\\s*(\\d+),\\s*(\\d+)");
+    if (status != 0 || size.empty())
         return report;
     report.read = true;
-    report.width = uint32_t(std::stoul(m[1]));
-    report.height = uint32_t(std::stoul(m[2]));
-    for (const std::smatch& id : AllMatches(json, "ID\\[\\\\\"EPSG\\\\\",(\\d+)\\]"))
-        report.epsg = std::stoi(id[1]);
+    report.width = uint32_t(size[0][0]);
+    report.height = uint32_t(size[0][1]);
+    for (const auto& id : NumbersIn(json, "ID\\[\\\\\"EPSG\\\\\",(\\d+)\\]"))
+        report.epsg = int(id[0]);
+    std::smatch m;
     if (std::regex_search(json, m, std::regex("UTM zone (\\d+)([NS])"))) // named without a code in NITF
         report.epsg = (m[2] == "N" ? 32600 : 32700) + std::stoi(m[1]);
-    const auto transform = AllMatches(json,
-                                      "\"geoTransform\":\\s*\\[" + kNumber + "," + kNumber + "," + kNumber + "," +
-                                          kNumber + "," + kNumber + "," + kNumber + "\\]");
-    for (size_t i = 0; !transform.empty() && i < 6; ++i)
-        report.geoTransform[i] = std::stod(transform[0][i + 1]);
-    for (const std::smatch& sum : AllMatches(json, "\"checksum\":\\s*(\\d+)"))
-        report.checksums.push_back(uint32_t(std::stoul(sum[1])));
-    for (const std::smatch& c : AllMatches(json, "\"colorInterpretation\":\\s*\"(\\w+)\""))
-        report.colourInterpretations.push_back(c[1]);
-    if ((report.hasNodata = std::regex_search(json, m, std::regex("\"noDataValue\":" + kNumber))))
-        report.nodata = std::stod(m[1]);
+    for (const auto& t : NumbersIn(json, "\"geoTransform\":\\s*\\[" + n + "," + n + "," + n + "," + n + "," + n + "," +
+                                             n + "\\]"))
+        std::copy(t.begin(), t.end(), report.geoTransform.begin());
+    for (const auto& sum : NumbersIn(json, "\"checksum\":\\s*(\\d+)"))
+        report.checksums.push_back(uint32_t(sum[0]));
+    const std::regex colour("\"colorInterpretation\":\\s*\"(\\w+)\"");
+    for (std::sregex_iterator it(json.begin(), json.end(), colour), end; it != end; ++it)
+        report.colourInterpretations.push_back((*it)[1]);
+    for (const auto& value : NumbersIn(json, "\"noDataValue\":" + n))
+        report.hasNodata = true, report.nodata = value[0];
     const size_t entries = json.find("\"entries\"");
     const std::string table =
         entries == std::string::npos ? "" : json.substr(entries, json.find('}', entries) - entries);
-    for (const std::smatch& e : AllMatches(table, "\\[\\s*(\\d+),\\s*(\\d+),\\s*(\\d+),\\s*\\d+\\s*\\]"))
-        report.colourTable.push_back({std::stoi(e[1]), std::stoi(e[2]), std::stoi(e[3])});
+    for (const auto& e : NumbersIn(table, "\\[\\s*(\\d+),\\s*(\\d+),\\s*(\\d+),\\s*\\d+\\s*\\]"))
+        report.colourTable.push_back({int(e[0]), int(e[1]), int(e[2])});
     return report;
 }
 
 std::string GdalSamples(const std::string& path, const std::string& options)
 {
     TempDirectory directory;
-    RunCommand("gdal_translate -q -of ENVI " + options + " '" + path + "' " + (directory / "samples.raw"));
+    RunCommand("gdal_translate -q -of ENVI -co INTERLEAVE=BIP " + options + " '" + path + "' " + (directory / "samples.raw"));
     return ReadWholeFile(directory / "samples.raw");
 }
 

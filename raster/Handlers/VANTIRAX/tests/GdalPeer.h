@@ -25,8 +25,10 @@ struct GdalReport {
 };
 
 GdalReport ReadWithGdal(const std::string& path);
-// The samples GDAL decodes, band sequential, after gdal_translate OPTIONS.
+// The samples GDAL decodes, pixel interleaved, after gdal_translate OPTIONS.
 std::string GdalSamples(const std::string& path, const std::string& options = "");
 // GDAL's checksum of one band of 8-bit pixels `stride` bytes apart: values
 // modulo a cycle of primes, summed, kept to 16 bits at the end of each row.
 uint32_t GdalChecksum(const uint8_t* pixels, uint32_t width, uint32_t height, size_t stride = 1);
+// Every match of the pattern in the text (a tool's JSON), its groups read as numbers.
+std::vector<std::vector<double>> NumbersIn(const std::string& text, const std::string& pattern);
