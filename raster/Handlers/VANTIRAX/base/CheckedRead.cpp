@@ -12,7 +12,7 @@ bool CheckedRead(CFileReader& reader, uint64_t fileSize, uint64_t offset, void* 
     // Reads that follow one another in the file (the fields of a header, the
     // bands of a row stored by row) need no seek between them.
     if (reader.position != offset)
-        reader.SeekTo(static_cast<int32_t>(offset), kSeekSet);
+        reader.SeekTo(static_cast<int64_t>(offset), kSeekSet);
     if (reader.error == kSeekFailed)
         return false;
     reader.ReadBytes(buffer, static_cast<uint32_t>(count));
@@ -37,10 +37,19 @@ bool FileCursor::Read(void* target, uint64_t count)
 
 bool FileCursor::Number(unsigned width, int32_t& value)
 {
+    int64_t wide = 0;
+    if (!Number(width, wide))
+        return false;
+    value = wide > INT32_MAX || wide < INT32_MIN ? 0 : static_cast<int32_t>(wide);
+    return true;
+}
+
+bool FileCursor::Number(unsigned width, int64_t& value)
+{
     char field[16];
     if (width >= sizeof field || !Read(field, width))
         return false;
-    value = FieldToLong(field, width);
+    value = FieldToWide(field, width);
     return true;
 }
 

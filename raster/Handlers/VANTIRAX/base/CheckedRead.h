@@ -1,7 +1,6 @@
 // The one way a section, subheader, table, block or stream is read from a
 // file: count bytes at an absolute offset, made only when they lie within
-// the file and within the offsets the reader can seek to. Offsets are 64-bit
-// here; the casts to the reader's 32-bit seeks live in CheckedRead alone.
+// the file and within the offsets the reader can seek to.
 #pragma once
 
 #include "base/CheckedMath.h"
@@ -45,6 +44,7 @@ public:
     bool Read(void* target, uint64_t count);
     // A decimal text field of width characters (at most 15).
     bool Number(unsigned width, int32_t& value);
+    bool Number(unsigned width, int64_t& value);
     // A most-significant-byte-first binary number of 2 or 4 bytes.
     bool Binary(unsigned width, uint32_t& value);
 

@@ -21,15 +21,18 @@ void CopyField(char* target, const char* text, unsigned width)
 
 } // namespace
 
-int32_t FieldToLong(const char* text, unsigned width)
+int64_t FieldToWide(const char* text, unsigned width)
 {
     if (text == nullptr || width >= kLongFieldLimit)
         return 0;
     char field[kLongFieldLimit];
     CopyField(field, text, width);
-    // 15 digits can exceed 32 bits: convert wide, then keep the low 32 bits as atol would on
-    // the original platform (where long is 32 bits) only for values that fit.
-    long long value = std::strtoll(field, nullptr, 10);
+    return std::strtoll(field, nullptr, 10); // 15 digits always fit
+}
+
+int32_t FieldToLong(const char* text, unsigned width)
+{
+    const int64_t value = FieldToWide(text, width);
     if (value > INT32_MAX || value < INT32_MIN)
         return 0;
     return static_cast<int32_t>(value);

@@ -6,5 +6,6 @@
 
 #include <cstdint>
 
-int32_t FieldToLong(const char* text, unsigned width);   // width >= 16 gives 0
+int32_t FieldToLong(const char* text, unsigned width);   // width >= 16 gives 0; so does a value past 32 bits
+int64_t FieldToWide(const char* text, unsigned width);   // the same with 64-bit values, for FL and LI
 double FieldToDouble(const char* text, unsigned width);  // width >= 32 gives 0.0

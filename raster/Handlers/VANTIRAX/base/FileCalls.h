@@ -15,9 +15,9 @@ uint32_t Read(uint32_t handle, void* buffer, uint32_t count);
 struct SeekOutcome {
     bool failed;
     bool endOfFile;     // the failure was the system's end-of-file error
-    uint32_t position;  // the new position when the seek succeeded
+    uint64_t position;  // the new position when the seek succeeded
 };
-SeekOutcome Seek(uint32_t handle, int32_t offset, int origin);
+SeekOutcome Seek(uint32_t handle, int64_t offset, int origin);
 void Close(uint32_t handle);
 // The file's size in bytes, 0 when it cannot be learnt.
 uint64_t Size(uint32_t handle);

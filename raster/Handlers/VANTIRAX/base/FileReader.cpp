@@ -35,14 +35,14 @@ void CFileReader::ReadBytes(void* buffer, uint32_t count)
     position += done;
 }
 
-void CFileReader::SeekTo(int32_t offset, int origin)
+void CFileReader::SeekTo(int64_t offset, int origin)
 {
     if (!HoldsFile() || error == kSeekFailed)
         return;
     filecalls::SeekOutcome outcome = filecalls::Seek(handle, offset, origin);
     if (outcome.failed) {
         error = kSeekFailed;
-        position = 0xFFFFFFFF;
+        position = UINT64_MAX;
         if (outcome.endOfFile)
             endOfFile = 1;
         return;

@@ -17,7 +17,7 @@ class CFileReader {
 public:
     uint32_t handle = kNoFile;
     int32_t error = 0;        // kSeekFailed once a seek failed; reads and seeks then do nothing
-    uint32_t position = 0;    // set by seeks, advanced by reads
+    uint64_t position = 0;    // set by seeks, advanced by reads
     uint8_t endOfFile = 0;    // 1 once a read came up short
     char path[kReaderPathSize] = {};
 
@@ -34,7 +34,7 @@ public:
     void OpenFile(const char* filePath, uint32_t shareMode);
     // Reads count bytes into buffer; a short read sets endOfFile.
     void ReadBytes(void* buffer, uint32_t count);
-    void SeekTo(int32_t offset, int origin);
+    void SeekTo(int64_t offset, int origin);
     void CloseFile();
 
     bool HoldsFile() const { return handle != 0 && handle != kNoFile; }

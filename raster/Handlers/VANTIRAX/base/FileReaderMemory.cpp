@@ -71,7 +71,7 @@ uint32_t Read(uint32_t handle, void* buffer, uint32_t count)
     return got;
 }
 
-SeekOutcome Seek(uint32_t handle, int32_t offset, int origin)
+SeekOutcome Seek(uint32_t handle, int64_t offset, int origin)
 {
     std::lock_guard<std::mutex> hold(registryLock);
     OpenFile* file = Slot(handle);
@@ -80,11 +80,11 @@ SeekOutcome Seek(uint32_t handle, int32_t offset, int origin)
     int64_t base = origin == kSeekCurrent ? int64_t(file->position)
                    : origin == kSeekEnd   ? int64_t(file->contents.size)
                                           : 0;
-    int64_t reached = base + offset;
-    if (reached < 0 || reached > int64_t(UINT32_MAX - 1))
+    int64_t reached = 0;
+    if (__builtin_add_overflow(base, offset, &reached) || reached < 0)
         return {true, false, 0};
     file->position = uint64_t(reached);
-    return {false, false, static_cast<uint32_t>(reached)};
+    return {false, false, file->position};
 }
 
 void Close(uint32_t handle)

@@ -37,13 +37,14 @@ uint32_t Read(uint32_t handle, void* buffer, uint32_t count)
     return done;
 }
 
-SeekOutcome Seek(uint32_t handle, int32_t offset, int origin)
+SeekOutcome Seek(uint32_t handle, int64_t offset, int origin)
 {
+    static_assert(sizeof(off_t) == sizeof(int64_t), "file offsets must be 64-bit");
     int whence = origin == kSeekCurrent ? SEEK_CUR : origin == kSeekEnd ? SEEK_END : SEEK_SET;
-    off_t reached = ::lseek(static_cast<int>(handle), offset, whence);
-    if (reached < 0 || reached > off_t(UINT32_MAX - 1))
+    off_t reached = ::lseek(static_cast<int>(handle), static_cast<off_t>(offset), whence);
+    if (reached < 0)
         return {true, false, 0};
-    return {false, false, static_cast<uint32_t>(reached)};
+    return {false, false, static_cast<uint64_t>(reached)};
 }
 
 void Close(uint32_t handle)

@@ -1,5 +1,5 @@
-// File calls over the Windows HFILE functions (_lopen, _lread, _llseek,
-// _lclose).
+// File calls over the Win32 file functions (CreateFileA, ReadFile,
+// SetFilePointerEx, CloseHandle), with 64-bit positions throughout.
 #include "base/FileCalls.h"
 
 #include "base/FileReader.h"
@@ -9,7 +9,7 @@
 namespace filecalls {
 namespace {
 
-// An HFILE is a kernel handle cut to 32 bits; kernel handles are defined to
+// A handle is a kernel handle cut to 32 bits; kernel handles are defined to
 // survive that, and sign extension brings back the full value.
 HANDLE KernelHandle(uint32_t handle)
 {
@@ -20,27 +20,40 @@ HANDLE KernelHandle(uint32_t handle)
 
 uint32_t Open(const char* path, uint32_t shareMode)
 {
-    HFILE file = _lopen(path, static_cast<int>(shareMode));
-    return file == HFILE_ERROR ? kNoFile : static_cast<uint32_t>(file);
+    const DWORD sharing = shareMode == kShareDenyWrite ? FILE_SHARE_READ : FILE_SHARE_READ | FILE_SHARE_WRITE;
+    HANDLE file = CreateFileA(path, GENERIC_READ, sharing, nullptr, OPEN_EXISTING, FILE_ATTRIBUTE_NORMAL, nullptr);
+    if (file == INVALID_HANDLE_VALUE)
+        return kNoFile;
+    return static_cast<uint32_t>(reinterpret_cast<uintptr_t>(file));
 }
 
 uint32_t Read(uint32_t handle, void* buffer, uint32_t count)
 {
-    UINT got = _lread(static_cast<HFILE>(handle), buffer, count);
-    return got == static_cast<UINT>(HFILE_ERROR) ? 0 : got;
+    auto* target = static_cast<char*>(buffer);
+    uint32_t done = 0;
+    while (done < count) {
+        DWORD got = 0;
+        if (!ReadFile(KernelHandle(handle), target + done, count - done, &got, nullptr) || got == 0)
+            break;
+        done += got;
+    }
+    return done;
 }
 
-SeekOutcome Seek(uint32_t handle, int32_t offset, int origin)
+SeekOutcome Seek(uint32_t handle, int64_t offset, int origin)
 {
-    LONG reached = _llseek(static_cast<HFILE>(handle), offset, origin);
-    if (reached == HFILE_ERROR)
+    const DWORD method = origin == kSeekCurrent ? FILE_CURRENT : origin == kSeekEnd ? FILE_END : FILE_BEGIN;
+    LARGE_INTEGER distance {};
+    distance.QuadPart = offset;
+    LARGE_INTEGER reached {};
+    if (!SetFilePointerEx(KernelHandle(handle), distance, &reached, method))
         return {true, GetLastError() == ERROR_HANDLE_EOF, 0};
-    return {false, false, static_cast<uint32_t>(reached)};
+    return {false, false, static_cast<uint64_t>(reached.QuadPart)};
 }
 
 void Close(uint32_t handle)
 {
-    _lclose(static_cast<HFILE>(handle));
+    CloseHandle(KernelHandle(handle));
 }
 
 uint64_t Size(uint32_t handle)

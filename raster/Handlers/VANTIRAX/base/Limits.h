@@ -5,10 +5,9 @@
 
 #include <cstdint>
 
-// The largest file offset the reader can seek to (its seeks take 32-bit
-// signed offsets): every read ends at or before it, and a NITF file larger
-// than this is not read at all.
-constexpr uint64_t kLargestReaderOffset = 0x7FFFFFFF;
+// The largest file a reader reads: the largest FL (12 digits). Every read
+// ends at or before it; positions and seeks are 64-bit below it.
+constexpr uint64_t kLargestReaderOffset = 999999999999;
 
 // Path bytes a reader holds, the terminator included; longer paths are refused.
 constexpr unsigned kReaderPathSize = 260;

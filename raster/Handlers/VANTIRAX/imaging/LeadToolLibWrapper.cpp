@@ -203,7 +203,7 @@ bool CLeadToolLibWrapper::PrepareBiLevel()
     return true;
 }
 
-bool CLeadToolLibWrapper::PrepareJpeg(CFileReader& reader, uint32_t dataOffset, uint32_t /*LI*/, uint32_t NBPP)
+bool CLeadToolLibWrapper::PrepareJpeg(CFileReader& reader, uint64_t dataOffset, uint64_t /*LI*/, uint32_t NBPP)
 {
     if (!EnsureLibrary() || IsUnservedDepth(NBPP))
         return false;
@@ -213,7 +213,7 @@ bool CLeadToolLibWrapper::PrepareJpeg(CFileReader& reader, uint32_t dataOffset, 
     return true;
 }
 
-bool CLeadToolLibWrapper::Open(CFileReader& reader, uint32_t dataOffset, uint32_t blockCount, uint32_t LI,
+bool CLeadToolLibWrapper::Open(CFileReader& reader, uint64_t dataOffset, uint32_t blockCount, uint64_t LI,
                                uint32_t NBPP, uint32_t NBANDS, uint32_t NCOLS, uint32_t NROWS, bool oneDimensional,
                                uint32_t blockWidth, uint32_t blockHeight, bool downsampledFrames)
 {
@@ -239,7 +239,7 @@ bool CLeadToolLibWrapper::Open(CFileReader& reader, uint32_t dataOffset, uint32_
 }
 
 // The first segment after the first stream's SOI must be the NITF APP6 segment.
-bool CLeadToolLibWrapper::ReadNitfApp6(CFileReader& reader, uint32_t dataOffset)
+bool CLeadToolLibWrapper::ReadNitfApp6(CFileReader& reader, uint64_t dataOffset)
 {
     const uint64_t fileEnd = ReachableBytes(reader.FileSize());
     if (dataOffset >= fileEnd)
@@ -270,7 +270,7 @@ void CLeadToolLibWrapper::AllocateBitmaps(const ImagingBinding& library)
     }
 }
 
-bool CLeadToolLibWrapper::openJPEGBitmap(CFileReader& reader, uint32_t dataOffset, uint32_t dataLength)
+bool CLeadToolLibWrapper::openJPEGBitmap(CFileReader& reader, uint64_t dataOffset, uint64_t dataLength)
 {
     ImagingBinding library {};
     LOADFILEOPTION options {};
@@ -307,7 +307,7 @@ bool CLeadToolLibWrapper::openJPEGBitmap(CFileReader& reader, uint32_t dataOffse
         if (!LocateStream(reader, start, end, stream))
             throw std::runtime_error(kDamagedImageText);
         options.maxBytes = kMaxDecodedImageBytes - imageBytes;
-        if (!LoadBlock(reader, library, block, static_cast<uint32_t>(stream.offset), stream.length, options))
+        if (!LoadBlock(reader, library, block, stream.offset, stream.length, options))
             return false;
         imageBytes += BitmapBytes(bitmaps[block]);
         next = stream.offset + stream.length;
@@ -323,7 +323,7 @@ uint32_t CLeadToolLibWrapper::LoadFlags() const
 // One block's stream, loaded as it stands in the file; a stream the loader
 // refuses is tried again with the default tables that it lacks.
 bool CLeadToolLibWrapper::LoadBlock(CFileReader& reader, const ImagingBinding& library, uint32_t block,
-                                    uint32_t offset, uint32_t length, LOADFILEOPTION& options)
+                                    uint64_t offset, uint32_t length, LOADFILEOPTION& options)
 {
     FILEINFO info = FreshFileInfo();
     int loaded = library.L_LoadFileOffset(static_cast<int>(reader.handle), offset, length, bitmaps[block],
@@ -353,7 +353,7 @@ CLeadToolLibWrapper::BlockFill CLeadToolLibWrapper::FillOf(const FILEINFO& info)
 }
 
 bool CLeadToolLibWrapper::LoadWithDefaultTables(CFileReader& reader, const ImagingBinding& library, uint32_t block,
-                                                uint32_t offset, uint32_t length, LOADFILEOPTION& options,
+                                                uint64_t offset, uint32_t length, LOADFILEOPTION& options,
                                                 FILEINFO& info)
 {
     const uint64_t room = uint64_t(length) + kDqtSegmentSize + kDhtSegmentSize;
@@ -385,7 +385,7 @@ bool CLeadToolLibWrapper::LoadWithDefaultTables(CFileReader& reader, const Imagi
                                 &info) == kLoadSucceeded;
 }
 
-bool CLeadToolLibWrapper::openBiLevelBitmap(CFileReader& reader, uint32_t dataOffset, uint32_t LI, uint32_t NCOLS,
+bool CLeadToolLibWrapper::openBiLevelBitmap(CFileReader& reader, uint64_t dataOffset, uint64_t LI, uint32_t NCOLS,
                                             uint32_t NROWS, bool oneDimensional)
 {
     ImagingBinding library {};
@@ -394,20 +394,21 @@ bool CLeadToolLibWrapper::openBiLevelBitmap(CFileReader& reader, uint32_t dataOf
     if (bitmaps != nullptr)
         throw std::runtime_error(kReinitialisedText);
     bitmapCount = 1;
-    // Every coded row takes at least one bit of the strip.
-    // Readable holds LI below 2 GiB, so the wrapped total cannot wrap around.
+    // Every coded row takes at least one bit of the strip, which is held whole
+    // behind its TIFF header in one buffer of a 32-bit size.
     const uint64_t fileSize = reader.FileSize();
-    if (LI == 0 || !Readable(dataOffset, LI, fileSize) || NCOLS == 0 || NROWS == 0 || NROWS / 8 > LI)
+    if (LI == 0 || LI > UINT32_MAX - kBiLevelHeaderSize || !Readable(dataOffset, LI, fileSize) || NCOLS == 0 ||
+        NROWS == 0 || NROWS / 8 > LI)
         return false;
     AllocateBitmaps(library);
-    const uint32_t total = LI + kBiLevelHeaderSize;
+    const uint32_t total = static_cast<uint32_t>(LI) + kBiLevelHeaderSize;
     std::unique_ptr<uint8_t[]> file(new (std::nothrow) uint8_t[total]);
     if (!file)
         throw std::runtime_error(kOutOfMemoryText);
     PutBigEndian32(tiffHeader + kTiffImageWidthValue, NCOLS);
     PutBigEndian32(tiffHeader + kTiffImageLengthValue, NROWS);
     PutBigEndian32(tiffHeader + kTiffRowsPerStripValue, NROWS);
-    PutBigEndian32(tiffHeader + kTiffStripByteCountsValue, LI);
+    PutBigEndian32(tiffHeader + kTiffStripByteCountsValue, static_cast<uint32_t>(LI));
     PutBigEndian32(tiffHeader + kTiffT4OptionsValue, oneDimensional ? kT4OneDimensional : kT4TwoDimensional);
     std::memcpy(file.get(), tiffHeader, kBiLevelHeaderSize);
     if (!CheckedRead(reader, fileSize, dataOffset, file.get() + kBiLevelHeaderSize, LI))

@@ -51,14 +51,14 @@ public:
     bool PrepareBiLevel();
     // The data must begin with SOI (fill bytes may lead it) and the NITF APP6
     // segment; NBPP 12 and 16 are refused.
-    bool PrepareJpeg(CFileReader& reader, uint32_t dataOffset, uint32_t LI, uint32_t NBPP);
+    bool PrepareJpeg(CFileReader& reader, uint64_t dataOffset, uint64_t LI, uint32_t NBPP);
     // Decodes every block. JPEG streams lie within the LI bytes from
     // dataOffset (LI 0: up to the end of the file). blockWidth and
     // blockHeight (NPPBH, NPPBV) bound the size a block's stream may declare;
     // 0 means not known, and the bound is then the largest block NITF allows
     // for an image of NCOLS x NROWS, and any frame fills its block.
     // downsampled: the image is "I1".
-    bool Open(CFileReader& reader, uint32_t dataOffset, uint32_t blockCount, uint32_t LI, uint32_t NBPP,
+    bool Open(CFileReader& reader, uint64_t dataOffset, uint32_t blockCount, uint64_t LI, uint32_t NBPP,
               uint32_t NBANDS, uint32_t NCOLS, uint32_t NROWS, bool oneDimensional,
               uint32_t blockWidth = 0, uint32_t blockHeight = 0, bool downsampled = false);
     // Row `row` of block `block`, columns firstColumn to lastColumn, into
@@ -70,9 +70,9 @@ public:
                 uint8_t* destination);
     void FreeBitmaps();
 
-    bool ReadNitfApp6(CFileReader& reader, uint32_t dataOffset);
-    bool openJPEGBitmap(CFileReader& reader, uint32_t dataOffset, uint32_t dataLength);
-    bool openBiLevelBitmap(CFileReader& reader, uint32_t dataOffset, uint32_t LI, uint32_t NCOLS, uint32_t NROWS,
+    bool ReadNitfApp6(CFileReader& reader, uint64_t dataOffset);
+    bool openJPEGBitmap(CFileReader& reader, uint64_t dataOffset, uint64_t dataLength);
+    bool openBiLevelBitmap(CFileReader& reader, uint64_t dataOffset, uint64_t LI, uint32_t NCOLS, uint32_t NROWS,
                            bool oneDimensional);
 
     uint8_t quality() const { return app6[kApp6QualityOffset]; }
@@ -105,8 +105,8 @@ private:
                     uint32_t lastColumn, uint32_t byteCount, uint8_t* destination);
     void AllocateBitmaps(const ImagingBinding& library);
     uint32_t LoadFlags() const;
-    bool LoadBlock(CFileReader& reader, const ImagingBinding& library, uint32_t block, uint32_t offset,
+    bool LoadBlock(CFileReader& reader, const ImagingBinding& library, uint32_t block, uint64_t offset,
                    uint32_t length, LOADFILEOPTION& options);
-    bool LoadWithDefaultTables(CFileReader& reader, const ImagingBinding& library, uint32_t block, uint32_t offset,
+    bool LoadWithDefaultTables(CFileReader& reader, const ImagingBinding& library, uint32_t block, uint64_t offset,
                                uint32_t length, LOADFILEOPTION& options, FILEINFO& info);
 };

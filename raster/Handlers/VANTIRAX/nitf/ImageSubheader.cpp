@@ -221,13 +221,13 @@ bool CNitfImage::ReadExtensions(FileCursor& cursor)
 bool CNitfImage::PlaceData(FileCursor& cursor, uint32_t offset)
 {
     if (subheaderLength == 0) {
-        dataOffset = static_cast<uint32_t>(cursor.Position());
+        dataOffset = cursor.Position();
         return true;
     }
     const uint64_t declaredEnd = uint64_t(offset) + subheaderLength;
     if (cursor.Position() > declaredEnd || declaredEnd > kLargestReaderOffset)
         return false;
-    dataOffset = static_cast<uint32_t>(declaredEnd);
+    dataOffset = declaredEnd;
     return true;
 }
 
@@ -241,10 +241,10 @@ bool CNitfImage::ReadMaskTable(FileCursor& cursor)
     if (!cursor.SeekTo(dataOffset) || !cursor.Binary(4, IMDATOFF) || !cursor.Binary(2, BMRLNTH) ||
         !cursor.Binary(2, TMRLNTH) || !cursor.Binary(2, TPXCDLNTH))
         return false;
-    const uint64_t blockedData = uint64_t(dataOffset) + IMDATOFF;
+    const uint64_t blockedData = dataOffset + IMDATOFF;
     if (blockedData > kLargestReaderOffset)
         return false;
-    dataOffset = static_cast<uint32_t>(blockedData);
+    dataOffset = blockedData;
     maskTableLength = IMDATOFF;
     if (TPXCDLNTH != 0 && !cursor.Skip((TPXCDLNTH - 1) / 8 + 1))
         return false;

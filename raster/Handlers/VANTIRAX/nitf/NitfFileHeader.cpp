@@ -63,11 +63,11 @@ bool ReadSegmentGroup(FileCursor& cursor, SegmentGroupLayout layout, int32_t& co
     list = new NitfSegmentLength[static_cast<size_t>(count)];
     for (int32_t i = 0; i < count; ++i) {
         int32_t subheaderLength = 0;
-        int32_t dataLength = 0;
+        int64_t dataLength = 0;
         if (!cursor.Number(layout.subheaderWidth, subheaderLength) ||
             !cursor.Number(layout.dataWidth, dataLength) || subheaderLength < 0 || dataLength < 0)
             return false;
-        list[i] = {static_cast<uint32_t>(subheaderLength), static_cast<uint32_t>(dataLength)};
+        list[i] = {static_cast<uint32_t>(subheaderLength), static_cast<uint64_t>(dataLength)};
     }
     return true;
 }
@@ -107,8 +107,6 @@ bool CNitfFileHeader::Parse()
         if (!reader.HoldsFile())
             return false;
         uint64_t fileSize = reader.FileSize();
-        if (fileSize > kLargestReaderOffset)
-            return false;
         FileCursor cursor(reader, fileSize);
 
         if (!cursor.Read(headerText, kVersionTextSize) || std::memcmp(headerText, "NITF02", 6) != 0)
@@ -129,7 +127,7 @@ bool CNitfFileHeader::Parse()
                 return false;
             fixedLayout = 0;
         }
-        FL = static_cast<uint32_t>(fileSize);
+        FL = fileSize;
 
         if (!ReadSegmentGroup(cursor, {6, 10}, NUMI, imageSegments) ||
             !ReadSegmentGroup(cursor, {4, 6}, NUMS, graphicSegments) ||

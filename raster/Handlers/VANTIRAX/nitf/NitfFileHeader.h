@@ -8,7 +8,7 @@
 
 struct NitfSegmentLength {
     uint32_t subheaderLength; // LISH, LSSH, LLSH, LTSH, LDSH or LRESH
-    uint32_t dataLength;      // LI, LS, LL, LT, LD or LRE
+    uint64_t dataLength;      // LI, LS, LL, LT, LD or LRE
 };
 
 constexpr uint32_t kNoUserHeader = 0xFFFFFFFF;
@@ -37,7 +37,7 @@ public:
     int32_t XHDLOFL = 0;
     uint8_t* XHD = nullptr;             // XHDL - 3 bytes
     uint32_t HL = 0;
-    uint32_t FL = 0;
+    uint64_t FL = 0;
     uint32_t userHeaderOffset = 0;      // file offset of UDHOFL; kNoUserHeader when UDHDL is 0
     uint16_t fixedLayout = 0;           // 1: FL at offset 342; 0: at 382 (NITF 2.0 with FSDEVT)
     uint16_t version21 = 0;

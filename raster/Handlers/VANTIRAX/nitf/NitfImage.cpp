@@ -64,7 +64,7 @@ bool CNitfImage::GetPaletteEntry(int32_t index, uint8_t& red, uint8_t& green, ui
     return true;
 }
 
-bool CNitfImage::PrepareData(CFileReader& reader, uint32_t dataLength)
+bool CNitfImage::PrepareData(CFileReader& reader, uint64_t dataLength)
 {
     isPrepared = 0;
     FreeVector(streamIndex);
@@ -163,7 +163,7 @@ bool CNitfImage::DataFitsFile() const
 
 // JPEG rows come out one byte per pixel (grey) or three (colour), which is
 // what the row buffer holds; the decoder holds a bitmap per stored block.
-bool CNitfImage::PrepareJpegData(CFileReader& reader, uint32_t dataLength)
+bool CNitfImage::PrepareJpegData(CFileReader& reader, uint64_t dataLength)
 {
     const int64_t bits = int64_t(NBPP) * NBANDS;
     if ((bits != 8 && bits != 24) || dataLength <= maskTableLength)
@@ -175,7 +175,7 @@ bool CNitfImage::PrepareJpegData(CFileReader& reader, uint32_t dataLength)
     FreeVector(decoder.streamOffsets);
     if (isMasked && !IndexMaskedStreams())
         return false;
-    const uint32_t firstStream = isMasked ? dataOffset + decoder.streamOffsets[0] : dataOffset;
+    const uint64_t firstStream = isMasked ? dataOffset + decoder.streamOffsets[0] : dataOffset;
     return decoder.PrepareJpeg(reader, firstStream, dataLength, uint32_t(NBPP));
 }
 
@@ -210,7 +210,7 @@ void CNitfImage::AllocLineBuffer()
         lineBuffer.resize(size_t(NBANDS) * size_t(NPPBH) * size_t(bytesPerPixel));
 }
 
-bool CNitfImage::OpenCompressed(CFileReader& reader, uint32_t dataLength)
+bool CNitfImage::OpenCompressed(CFileReader& reader, uint64_t dataLength)
 {
     const bool jpeg =
         compressionKind == kJpeg || compressionKind == kLosslessJpeg || compressionKind == kDownsampledJpeg;
@@ -222,8 +222,8 @@ bool CNitfImage::OpenCompressed(CFileReader& reader, uint32_t dataLength)
         return false;
     const uint32_t blocks = jpeg ? storedBlockCount : uint32_t(NBPR) * uint32_t(NBPC);
     // The mask table counts in LI: the blocks end where the image data ends.
-    const uint32_t blockedLength = dataLength > maskTableLength ? dataLength - maskTableLength : 0;
-    const uint32_t length = static_cast<uint32_t>(std::min<uint64_t>(blockedLength, readLimit - dataOffset));
+    const uint64_t blockedLength = dataLength > maskTableLength ? dataLength - maskTableLength : 0;
+    const uint64_t length = std::min<uint64_t>(blockedLength, readLimit - dataOffset);
     return decoder.Open(reader, dataOffset, blocks, length, uint32_t(NBPP), uint32_t(NBANDS), uint32_t(NCOLS),
                         uint32_t(NROWS), COMRAT[0] == '1', uint32_t(NPPBH), uint32_t(NPPBV),
                         compressionKind == kDownsampledJpeg);

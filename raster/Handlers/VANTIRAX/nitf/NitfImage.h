@@ -42,7 +42,7 @@ constexpr unsigned kCommentSize = 80;
 
 class CNitfImage {
 public:
-    uint32_t dataOffset = 0;        // first byte of (blocked) image data
+    uint64_t dataOffset = 0;        // first byte of (blocked) image data
     int32_t NBPR = 0, NBPC = 0;
     int32_t NPPBH = 0, NPPBV = 0;
     int32_t NBPP = 0;
@@ -86,7 +86,7 @@ public:
     void Release();
 
     // Whether the image is served; sets up the decoder for compressed kinds.
-    bool PrepareData(CFileReader& reader, uint32_t dataLength);
+    bool PrepareData(CFileReader& reader, uint64_t dataLength);
     bool IsPaletted() const;
     // Bytes per pixel of the rows the host expects: one palette index, or R,G,B.
     uint32_t HostPixelBytes() const;
@@ -95,7 +95,7 @@ public:
     void AllocLineBuffer();
     // Decodes a compressed image into the decoder; the decoder's error texts
     // pass through as exceptions.
-    bool OpenCompressed(CFileReader& reader, uint32_t dataLength);
+    bool OpenCompressed(CFileReader& reader, uint64_t dataLength);
     // One row, columns firstColumn..lastColumn inclusive, into out: one byte
     // per pixel for one band, three for three bands.
     bool ReadLine(CFileReader& reader, uint32_t row, int32_t firstColumn, int32_t lastColumn, uint8_t* out);
@@ -147,7 +147,7 @@ private:
     bool ValidGeometry();
     bool ServesUncompressed() const;
     bool DataFitsFile() const;
-    bool PrepareJpegData(CFileReader& reader, uint32_t dataLength);
+    bool PrepareJpegData(CFileReader& reader, uint64_t dataLength);
     bool IndexMaskedStreams();
     uint64_t BandBlockBytes() const;
 
