@@ -15,6 +15,7 @@
 #include "HandlerLibrary.h"
 #include "Info.h"
 #include "Mosaic.h"
+#include "PlatformFiles.h"
 #include "Render.h"
 
 #include <cstdio>
@@ -36,13 +37,13 @@ constexpr const char* kUsage =
     "  render [--jobs N] [--format tif|png] [--window X0,Y0,X1,Y1] -o OUTDIR FILE_OR_DIR...\n"
     "  mosaic -o OUT.tif FILE_OR_DIR...";
 
-// The directory of this executable, where the handler is built beside it.
+// The handler beside this executable's own file, wherever it was started
+// from: never one that happens to lie in the working directory.
 std::string DefaultHandlerPath(const char* argv0)
 {
-    std::string self = argv0;
-    size_t slash = self.find_last_of("/\\");   // Windows passes backslashes
-    std::string directory = slash == std::string::npos ? "." : self.substr(0, slash);
-    return directory + "/" VX_DEFAULT_HANDLER;
+    const std::string self = ExecutablePath(argv0);
+    const size_t slash = self.find_last_of("/\\");   // Windows paths use backslashes
+    return slash == std::string::npos ? std::string() : self.substr(0, slash + 1) + VX_DEFAULT_HANDLER;
 }
 
 std::string JsonString(const char* text)
@@ -156,6 +157,8 @@ int main(int argc, char** argv)
         return Fail(kExitUsage, message);
 
     Exports rh{};
+    if (handlerPath.empty())
+        return Fail(kExitUsage, "cannot tell where this program lies: give --handler PATH");
     if (!LoadHandler(handlerPath, rh, message))
         return Fail(kExitUsage, message);
     return Run(rh, command, line);

@@ -221,6 +221,18 @@ TEST(HostCommands, ExitSayAndLeave)
     }
 }
 
+// Started through a link from a folder that holds another file of the
+// handler's name, the host still loads the handler beside its own file.
+TEST(HostCommands, HandlerIsFoundBesideTheExecutableItself)
+{
+    TempDirectory elsewhere;
+    fs::create_symlink(VX_HOST_PATH, elsewhere / "rhlhost");
+    WriteFile(elsewhere / "VANTIRAX.rhl", "not a handler");
+    const ProcessResult result = RunProgram({elsewhere / "rhlhost", "identify"});
+    EXPECT_EQ(result.exitCode, 0) << result.err;
+    EXPECT_TRUE(Says(result, R"("name": "VANTIRAX.rhl")"));
+}
+
 TEST(HostBatch, FilesVanishingDuringTheBatchNeverStopIt)
 {
     constexpr int kFrames = 200;
