@@ -100,7 +100,7 @@ TEST(NitfFileHeader, RpfHeaderRecognisedOnlyWithLength62)
 TEST(NitfFileHeader, RefusesWrongVersionsAndLengthsThatLie)
 {
     const std::string good = BuildNitfFile(OneImage());
-    for (const char* version : {"NITF02.01", "NITF01.10", "NSIF01.00", "NITF03.00"})
+    for (const char* version : {"NITF02.01", "NITF01.10", "NSIF01.01", "NITF03.00"})
         EXPECT_FALSE(ParsedHeader(std::string(version) + good.substr(9)).parsed) << version;
     EXPECT_FALSE(ParsedHeader(good.substr(0, good.size() - 1)).parsed); // FL larger than the file
     EXPECT_FALSE(ParsedHeader(good + "x").parsed);                       // FL smaller than the file
