@@ -42,7 +42,7 @@ struct LoadedImage {
     std::vector<uint8_t> Row(uint32_t row, int32_t first = 0, int32_t last = -1)
     {
         last = last < 0 ? image.NCOLS - 1 : last;
-        std::vector<uint8_t> out(size_t(last - first + 1) * (image.NBANDS == 3 ? 3 : 1) + 1, 0xEE);
+        std::vector<uint8_t> out(size_t(last - first + 1) * image.HostPixelBytes() + 1, 0xEE);
         const bool read = image.ReadLine(reader, row, first, last, out.data());
         EXPECT_EQ(out.back(), 0xEE) << "row " << row << ": wrote past column " << last;
         out.pop_back();
@@ -84,7 +84,7 @@ inline int32_t WorstDifference(LoadedImage& loaded, const std::vector<uint32_t>&
 {
     const CNitfImage& image = loaded.image;
     const bool biLevel = image.compressionKind == kBiLevel;
-    const int32_t bands = biLevel ? 1 : image.NBANDS;
+    const int32_t bands = int32_t(image.HostPixelBytes()); // the first bands: R, G, B or the one shown
     const int32_t significant = image.ABPP >= 1 && image.ABPP <= image.NBPP ? image.ABPP : image.NBPP;
     const size_t plane = size_t(image.NCOLS) * size_t(image.NROWS);
     if (gdal.size() < plane * size_t(bands))
