@@ -5,6 +5,7 @@
 #include "nitf/NitfFileHeader.h"
 #include "nitf/NitfImage.h"
 
+#include <algorithm>
 #include <cstring>
 #include <strings.h>
 
@@ -66,7 +67,8 @@ void CNitfImage::ClearParsed()
 {
     dataOffset = 0;
     NBPR = NBPC = NPPBH = NPPBV = NBPP = ABPP = bytesPerPixel = 0;
-    isMono = isRgb = isMasked = isPrepared = 0;
+    isMono = isRgb = isMulti = isMasked = isPrepared = 0;
+    drawnBandCount = 0;
     compressionKind = kUncompressed;
     FreeVector(blockOffsets);
     FreeVector(streamIndex);
@@ -133,6 +135,7 @@ bool CNitfImage::ReadFront(FileCursor& cursor, uint32_t offset)
     NCOLS = FieldToLong(subheaderText + kNcolsPosition, 8);
     isMono = strncasecmp(IREP(), "MONO", 4) == 0;
     isRgb = strncasecmp(IREP(), "RGB", 3) == 0;
+    isMulti = strncasecmp(IREP(), "MULTI", 5) == 0;
     return true;
 }
 
@@ -194,7 +197,34 @@ bool CNitfImage::ReadBands(FileCursor& cursor)
         if (!cursor.Read(band.LUT.data(), lutSize))
             return false;
     }
+    ChooseDrawnBands();
     return true;
+}
+
+// An RGB image shows its three bands in file order; a MULTI one, or a MONO
+// one of several bands, the first bands whose IREPBAND is "R", "G" and "B"
+// when it has all three; any other image its first band.
+void CNitfImage::ChooseDrawnBands()
+{
+    drawnBandCount = 1;
+    drawnBands[0] = 0;
+    if (isRgb && NBANDS == int32_t(kRgbBands)) {
+        drawnBandCount = NBANDS;
+        drawnBands[1] = 1;
+        drawnBands[2] = 2;
+        return;
+    }
+    if (!isMono && !isMulti)
+        return;
+    int32_t found[kRgbBands] = {-1, -1, -1};
+    for (int32_t b = NBANDS - 1; b >= 0; --b)
+        for (size_t k = 0; k < kRgbBands; ++k)
+            if (bands[size_t(b)].IREPBAND[0] == "RGB"[k] && bands[size_t(b)].IREPBAND[1] == kBlank)
+                found[k] = b;
+    if (found[0] < 0 || found[1] < 0 || found[2] < 0)
+        return;
+    drawnBandCount = int32_t(kRgbBands);
+    std::copy(found, found + kRgbBands, drawnBands);
 }
 
 bool CNitfImage::ReadBlocking(FileCursor& cursor)
@@ -206,7 +236,7 @@ bool CNitfImage::ReadBlocking(FileCursor& cursor)
     NPPBH = FieldToLong(blockingText + 10, 4);
     NPPBV = FieldToLong(blockingText + 14, 4);
     NBPP = FieldToLong(blockingText + 18, 2);
-    bytesPerPixel = NBPP / 8;
+    bytesPerPixel = (NBPP + 7) / 8;
     ABPP = FieldToLong(subheaderText + kAbppPosition, 2);
     return true;
 }

@@ -12,7 +12,7 @@
 namespace {
 
 constexpr unsigned kByteBits = 8;
-constexpr size_t kRgbBands = 3;
+constexpr uint32_t kNibbleBits = 4;
 constexpr uint32_t kStripRows = 32; // rows of a block read at once: small enough to stay in the CPU caches
 
 } // namespace
@@ -22,8 +22,16 @@ uint32_t CNitfImage::OutputPixelBytes() const
     if (compressionKind == kBiLevel)
         return 1;
     if (compressionKind == kUncompressed)
-        return uint32_t(NBANDS);
+        return uint32_t(drawnBandCount);
     return uint32_t(NBPP) * uint32_t(NBANDS) / kByteBits;
+}
+
+bool CNitfImage::DrawsEveryBandInOrder() const
+{
+    for (int32_t drawn = 0; drawn < drawnBandCount; ++drawn)
+        if (drawnBands[drawn] != drawn)
+            return false;
+    return drawnBandCount == NBANDS;
 }
 
 bool CNitfImage::ReadLine(CFileReader& reader, uint32_t row, int32_t firstColumn, int32_t lastColumn, uint8_t* out)
@@ -61,10 +69,10 @@ bool CNitfImage::ReadUncompressedBlock(CFileReader& reader, uint32_t block, uint
 {
     const uint64_t blocks = uint64_t(NBPR) * uint64_t(NBPC);
     const bool bandsApart = IMODE() == 'S';
-    if (IMODE() == 'P') {
+    if (IMODE() == 'P' && !IsPacked()) {
         // All bands of a pixel stand together: one read for the span.
         if (isMasked && blockOffsets[block] == kBlockNotStored) {
-            std::memset(out, 0, size_t(n) * size_t(NBANDS));
+            std::memset(out, 0, size_t(n) * size_t(drawnBandCount));
             return true;
         }
         const uint64_t blockStart = isMasked ? blockOffsets[block] : block * BandBlockBytes() * uint64_t(NBANDS);
@@ -74,24 +82,25 @@ bool CNitfImage::ReadUncompressedBlock(CFileReader& reader, uint32_t block, uint
         const uint8_t* data = nullptr;
         if (!ReadSpan(reader, place, position, uint64_t(n) * pixelStride, data))
             return false;
-        if (bytesPerPixel == 1) {
+        if (bytesPerPixel == 1 && DrawsEveryBandInOrder()) {
             // 8-bit pixels stored as they are delivered: band after band.
             std::memcpy(out, data, size_t(n) * pixelStride);
             return true;
         }
-        for (int32_t band = 0; band < NBANDS; ++band)
-            ScatterBand(data + size_t(band) * size_t(bytesPerPixel), pixelStride, n, band, out);
+        for (int32_t drawn = 0; drawn < drawnBandCount; ++drawn)
+            ScatterBand(data + size_t(drawnBands[drawn]) * size_t(bytesPerPixel), pixelStride, n, drawn, out);
         return true;
     }
     // 8-bit RGB bands read from the cache are interleaved in one pass at the end.
     const uint8_t* held[kRgbBands] = {};
-    const bool interleave = NBANDS == int32_t(kRgbBands) && bytesPerPixel == 1;
-    for (int32_t band = 0; band < NBANDS; ++band) {
+    const bool interleave = drawnBandCount == int32_t(kRgbBands) && bytesPerPixel == 1;
+    for (int32_t drawn = 0; drawn < drawnBandCount; ++drawn) {
+        const int32_t band = drawnBands[drawn];
         uint64_t blockStart = 0;
         if (isMasked) {
             const uint32_t record = blockOffsets[bandsApart ? band * blocks + block : block];
             if (record == kBlockNotStored) {
-                ScatterBand(nullptr, 0, n, band, out);
+                ScatterBand(nullptr, 0, n, drawn, out);
                 continue;
             }
             blockStart = record;
@@ -100,8 +109,8 @@ bool CNitfImage::ReadUncompressedBlock(CFileReader& reader, uint32_t block, uint
             blockStart = bandsApart ? (uint64_t(band) * blocks + block) * BandBlockBytes()
                                     : uint64_t(block) * BandBlockBytes() * uint64_t(NBANDS);
         }
-        if (!ReadBandSpan(reader, blockStart, block % uint32_t(NBPR), band, rowInBlock, c0, n, out,
-                          interleave ? &held[band] : nullptr)) {
+        if (!ReadBandSpan(reader, blockStart, block % uint32_t(NBPR), drawn, rowInBlock, c0, n, out,
+                          interleave ? &held[drawn] : nullptr)) {
             ScatterHeld(held, n, out);
             return false;
         }
@@ -127,17 +136,22 @@ void CNitfImage::ScatterHeld(const uint8_t* const held[], uint32_t n, uint8_t* o
             ScatterBand(held[band], 1, n, int32_t(band), out);
 }
 
-// Band `band` of the span in a block stored by block ("B"), by row ("R") or
-// band-sequentially ("S", where blockStart is already that band's block).
-bool CNitfImage::ReadBandSpan(CFileReader& reader, uint64_t blockStart, uint32_t column, int32_t band,
+// Drawn band `drawn` of the span in a block stored by block ("B"), by row
+// ("R") or band-sequentially ("S", where blockStart is already that band's
+// block); packed pixels of one band in any IMODE.
+bool CNitfImage::ReadBandSpan(CFileReader& reader, uint64_t blockStart, uint32_t column, int32_t drawn,
                               uint32_t rowInBlock, uint32_t c0, uint32_t n, uint8_t* out, const uint8_t** deferred)
 {
+    const int32_t band = drawnBands[drawn];
     const uint64_t pixelBytes = uint64_t(bytesPerPixel);
     const uint64_t blockPosition = dataOffset + blockStart;
+    if (IsPacked())
+        return ReadPackedSpan(reader, blockPosition + (IMODE() == 'B' ? uint64_t(band) * BandBlockBytes() : 0),
+                              rowInBlock, c0, n, drawn, out);
     uint64_t pixelIndex = uint64_t(NPPBH) * rowInBlock + c0;
     // The strip holding the span: of the band's plane in IMODE "B" and "S",
     // of the rows of every band in IMODE "R".
-    const uint32_t bandSlot = uint32_t(band) * uint32_t(NBPR) + column;
+    const uint32_t bandSlot = uint32_t(drawn) * uint32_t(NBPR) + column;
     BlockPlace place = StripPlace(blockPosition, uint32_t(pixelBytes), rowInBlock, bandSlot);
     if (IMODE() == 'B') {
         pixelIndex += uint64_t(band) * uint64_t(NPPBH) * uint64_t(NPPBV);
@@ -156,7 +170,33 @@ bool CNitfImage::ReadBandSpan(CFileReader& reader, uint64_t blockStart, uint32_t
         *deferred = data;
         return true;
     }
-    ScatterBand(data, uint32_t(pixelBytes), n, band, out);
+    ScatterBand(data, uint32_t(pixelBytes), n, drawn, out);
+    return true;
+}
+
+// A span of packed pixels, read alone into the line buffer. Each pixel's
+// bits follow the last pixel's, most significant first: 1-bit pixels are
+// palette indices; a 12-bit pixel's three nibbles are its low byte, then its
+// high nibble, and its value is reduced as wider pixels are.
+bool CNitfImage::ReadPackedSpan(CFileReader& reader, uint64_t planeStart, uint32_t rowInBlock, uint32_t c0,
+                                uint32_t n, int32_t drawn, uint8_t* out)
+{
+    const uint64_t pixelBits = uint64_t(NBPP);
+    const uint64_t firstBit = (uint64_t(NPPBH) * rowInBlock + c0) * pixelBits;
+    const uint64_t firstByte = firstBit / kByteBits;
+    const uint64_t count = (firstBit + n * pixelBits + kByteBits - 1) / kByteBits - firstByte;
+    if (count > lineBuffer.size() || !CheckedRead(reader, readLimit, planeStart + firstByte, lineBuffer.data(), count))
+        return false;
+    const int32_t significant = SignificantBits();
+    uint64_t bit = firstBit % kByteBits;
+    for (uint32_t i = 0; i < n; ++i) {
+        uint64_t value = 0;
+        for (const uint64_t end = bit + pixelBits; bit < end; ++bit)
+            value = value << 1 | ((lineBuffer[bit / kByteBits] >> (kByteBits - 1 - bit % kByteBits)) & 1);
+        if (!OneBitIndices())
+            value = TopByte((value & 0xF) << kByteBits | value >> kNibbleBits, significant);
+        out[size_t(i) * size_t(drawnBandCount) + size_t(drawn)] = uint8_t(value);
+    }
     return true;
 }
 
@@ -184,7 +224,7 @@ const uint8_t* CNitfImage::CachedSpan(CFileReader& reader, const BlockPlace& pla
 {
     // P and R strips hold every band; B and S strips one band each.
     const bool bandsTogether = IMODE() == 'P' || IMODE() == 'R';
-    const uint64_t slots = uint64_t(NBPR) * uint64_t(bandsTogether ? 1 : NBANDS);
+    const uint64_t slots = uint64_t(NBPR) * uint64_t(bandsTogether ? 1 : drawnBandCount);
     const uint64_t slotBytes = std::min<uint64_t>(kStripRows, uint64_t(NPPBV)) * uint64_t(NPPBH) *
                                uint64_t(bytesPerPixel) * uint64_t(bandsTogether ? NBANDS : 1);
     uint64_t cacheBytes = slots;
@@ -211,12 +251,12 @@ bool CNitfImage::ReadSpan(CFileReader& reader, const BlockPlace& place, uint64_t
     return CheckedRead(reader, readLimit, position, lineBuffer.data(), count);
 }
 
-// Writes byte `band` of n output pixels from source pixels sourceStride bytes
-// apart; a null source writes zeros (a block the file does not store).
-void CNitfImage::ScatterBand(const uint8_t* source, uint32_t sourceStride, uint32_t n, int32_t band,
+// Writes byte `drawn` of n output pixels from source pixels sourceStride
+// bytes apart; a null source writes zeros (a block the file does not store).
+void CNitfImage::ScatterBand(const uint8_t* source, uint32_t sourceStride, uint32_t n, int32_t drawn,
                              uint8_t* out) const
 {
-    const size_t outStride = size_t(NBANDS);
+    const size_t outStride = size_t(drawnBandCount);
     if (source != nullptr && bytesPerPixel == 1) {
         // 8-bit samples are copied as they stand.
         if (outStride == 1 && sourceStride == 1) {
@@ -225,13 +265,13 @@ void CNitfImage::ScatterBand(const uint8_t* source, uint32_t sourceStride, uint3
         }
         if (outStride == kRgbBands && sourceStride == 1) {
             // One band of an RGB row: a constant stride the compiler can unroll.
-            uint8_t* target = out + band;
+            uint8_t* target = out + drawn;
             for (uint32_t i = 0; i < n; ++i)
                 target[size_t(i) * kRgbBands] = source[i];
             return;
         }
         for (uint32_t i = 0; i < n; ++i)
-            out[i * outStride + size_t(band)] = source[size_t(i) * sourceStride];
+            out[i * outStride + size_t(drawn)] = source[size_t(i) * sourceStride];
         return;
     }
     if (source != nullptr && bytesPerPixel == 2) {
@@ -239,12 +279,12 @@ void CNitfImage::ScatterBand(const uint8_t* source, uint32_t sourceStride, uint3
         const int32_t significant = SignificantBits();
         for (uint32_t i = 0; i < n; ++i) {
             const uint8_t* pixel = source + size_t(i) * sourceStride;
-            out[i * outStride + size_t(band)] = TopByte(uint64_t(pixel[0]) << kByteBits | pixel[1], significant);
+            out[i * outStride + size_t(drawn)] = TopByte(uint64_t(pixel[0]) << kByteBits | pixel[1], significant);
         }
         return;
     }
     for (uint32_t i = 0; i < n; ++i)
-        out[i * outStride + size_t(band)] = source == nullptr ? 0 : ConvertPixel(source + size_t(i) * sourceStride);
+        out[i * outStride + size_t(drawn)] = source == nullptr ? 0 : ConvertPixel(source + size_t(i) * sourceStride);
 }
 
 // A pixel wider than 8 bits (most significant byte first) becomes the 8 most

@@ -11,7 +11,7 @@ namespace {
 
 constexpr uint64_t kFixedLengthOffset = 342;   // FL in NITF 2.1 and NITF 2.0 without FSDEVT
 constexpr uint64_t kShiftedLengthOffset = 382; // FL in NITF 2.0 whose FSDWNG is 999998
-constexpr unsigned kVersionTextSize = 9;       // FHDR "NITF" + FVER "02.x0"
+constexpr unsigned kVersionTextSize = 9;       // FHDR and FVER: "NITF02.10", "NITF02.00" or "NSIF01.00"
 constexpr unsigned kFileLengthWidth = 12;
 constexpr unsigned kHeaderLengthWidth = 6;
 constexpr unsigned kCountWidth = 3;
@@ -20,6 +20,13 @@ constexpr unsigned kOverflowWidth = 3;         // UDHOFL, XHDLOFL
 // The length of the RPFHDR user-defined data: UDHOFL, tag, length and 48 bytes of header.
 constexpr int32_t kRpfUserHeaderLength = 62;
 constexpr char kRpfHeaderTag[] = "RPFHDR";
+
+// FHDR and FVER as "NITF02.10" names them; the character between FVER's
+// digits is not checked.
+bool VersionIs(const char* text, const char* version)
+{
+    return std::memcmp(text, version, 6) == 0 && std::memcmp(text + 7, version + 7, 2) == 0;
+}
 
 struct SegmentGroupLayout {
     unsigned subheaderWidth;
@@ -109,11 +116,12 @@ bool CNitfFileHeader::Parse()
         uint64_t fileSize = reader.FileSize();
         FileCursor cursor(reader, fileSize);
 
-        if (!cursor.Read(headerText, kVersionTextSize) || std::memcmp(headerText, "NITF02", 6) != 0)
+        if (!cursor.Read(headerText, kVersionTextSize))
             return false;
-        if (std::memcmp(headerText + 7, "10", 2) == 0)
+        // NSIF 1.0 is laid out as NITF 2.1.
+        if (VersionIs(headerText, "NITF02.10") || VersionIs(headerText, "NSIF01.00"))
             version21 = 1;
-        else if (std::memcmp(headerText + 7, "00", 2) == 0)
+        else if (VersionIs(headerText, "NITF02.00"))
             version21 = 0;
         else
             return false;

@@ -1,4 +1,4 @@
-// CNitfFileHeader: the NITF 2.0 / 2.1 file header, read to learn whether a
+// CNitfFileHeader: the NITF 2.0 / 2.1 (and NSIF 1.0) file header, read to learn whether a
 // file is NITF at all, where its segments lie and what user-defined header
 // data (the RPFHDR extension of RPF frames) it carries.
 #pragma once
@@ -40,7 +40,7 @@ public:
     uint64_t FL = 0;
     uint32_t userHeaderOffset = 0;      // file offset of UDHOFL; kNoUserHeader when UDHDL is 0
     uint16_t fixedLayout = 0;           // 1: FL at offset 342; 0: at 382 (NITF 2.0 with FSDEVT)
-    uint16_t version21 = 0;
+    uint16_t version21 = 0;             // 1 in NITF 2.1 and NSIF 1.0
 
     CNitfFileHeader() = default;
     ~CNitfFileHeader() { Release(); }

@@ -16,38 +16,65 @@ constexpr int32_t kGreyPaletteSize = 256;
 constexpr int32_t kLastPaletteIndex = 255;
 constexpr unsigned kRgbTables = 3;
 constexpr uint32_t kRgbPixelBytes = 3;
+constexpr uint8_t kWhite = 255;
 
-bool IsMonoDepth(int32_t NBPP)
+// Depths whose samples are reduced to 8 bits; 12-bit pixels are packed.
+bool IsReducedDepth(int32_t NBPP)
 {
-    return NBPP == 8 || NBPP == 16 || NBPP == 32 || NBPP == 64;
+    return NBPP == 8 || NBPP == 12 || NBPP == 16 || NBPP == 32 || NBPP == 64;
 }
 
 } // namespace
 
+bool CNitfImage::IsRgbLut() const
+{
+    return strncasecmp(IREP(), "RGB/LUT", 7) == 0;
+}
+
+// Uncompressed MONO and MULTI images show one band through the palette
+// unless they have R, G and B bands; compressed ones keep the decoder's bands.
 bool CNitfImage::IsPaletted() const
 {
-    return strncasecmp(IREP(), "RGB/LUT", 7) == 0 || isMono;
+    if (compressionKind == kUncompressed && (isMono || isMulti))
+        return drawnBandCount == 1;
+    return IsRgbLut() || isMono;
+}
+
+// A MULTI image's first band shows through its tables as colours when it
+// has three, as an RGB/LUT band does.
+bool CNitfImage::ColourPalette() const
+{
+    return IsRgbLut() || (isMulti && !bands.empty() && bands[0].NLUTS >= int32_t(kRgbTables));
+}
+
+// Uncompressed 1-bit pixels are palette indices 0 and 1, not reduced samples.
+bool CNitfImage::OneBitIndices() const
+{
+    return compressionKind == kUncompressed && NBPP == 1;
 }
 
 int32_t CNitfImage::GetPaletteSize() const
 {
-    if (isRgb && IsPaletted() && !bands.empty())
+    if (bands.empty())
+        return kGreyPaletteSize;
+    if (ColourPalette() || (OneBitIndices() && !bands[0].LUT.empty()))
         return bands[0].NELUT;
-    return kGreyPaletteSize;
+    return OneBitIndices() ? 2 : kGreyPaletteSize;
 }
 
 // Entries whose table position lies past the lookup data are not answered
 // (false); the caller leaves them black.
 bool CNitfImage::GetPaletteEntry(int32_t index, uint8_t& red, uint8_t& green, uint8_t& blue) const
 {
-    if (index < 0 || index > kLastPaletteIndex || bands.empty())
+    if (index < 0 || index > kLastPaletteIndex || index >= GetPaletteSize() || bands.empty())
         return false;
     const std::vector<uint8_t>& LUT = bands[0].LUT;
     const size_t i = size_t(index);
-    if (isMono) {
+    if (!ColourPalette()) {
         const size_t position = bytesPerPixel < 2 ? i : i * size_t(bytesPerPixel);
         if (LUT.empty()) {
-            red = green = blue = static_cast<uint8_t>(index);
+            // Without a table 1-bit pixels are black and white.
+            red = green = blue = OneBitIndices() ? uint8_t(index * kWhite) : uint8_t(index);
             return true;
         }
         if (position >= LUT.size())
@@ -122,19 +149,34 @@ bool CNitfImage::ValidGeometry()
 }
 
 // Real and complex pixels would show only their sign and exponent bits.
+// 1-bit pixels are palette indices; wider ones are reduced to 8 bits, except
+// through an RGB/LUT table. Packed pixels of several bands are read only
+// where each band's block stands alone (IMODE "B" and "S").
 bool CNitfImage::ServesUncompressed() const
 {
     const char PVTYPE = subheaderText[kPvtypePosition];
     if (PVTYPE == 'R' || PVTYPE == 'C')
         return false;
-    if (isMono)
-        return NBANDS == 1 && IsMonoDepth(NBPP);
-    return isRgb && NBPP == 8 && NBANDS == (IsPaletted() ? 1 : int32_t(kRgbTables));
+    if (IsPacked() && NBANDS > 1 && IMODE() != 'B' && IMODE() != 'S')
+        return false;
+    if (IsRgbLut())
+        return NBANDS == 1 && (NBPP == 1 || NBPP == 8);
+    if (!isMono && !isMulti && !(isRgb && drawnBandCount == int32_t(kRgbTables)))
+        return false;
+    return NBPP == 1 ? drawnBandCount == 1 : IsReducedDepth(NBPP);
 }
 
+// NBPP 1 and 12: pixels that do not fill whole bytes.
+bool CNitfImage::IsPacked() const
+{
+    return NBPP % 8 != 0;
+}
+
+// Packed pixels run on across the rows of a block, and each band's block
+// starts on a byte. No overflow: sizes of 8 digits and an NBPP of 2.
 uint64_t CNitfImage::BandBlockBytes() const
 {
-    return uint64_t(NPPBH) * uint64_t(NPPBV) * uint64_t(bytesPerPixel);
+    return (uint64_t(NPPBH) * uint64_t(NPPBV) * uint64_t(NBPP) + 7) / 8;
 }
 
 // Every block the rows address must lie in the file: the whole image data
@@ -142,9 +184,8 @@ uint64_t CNitfImage::BandBlockBytes() const
 bool CNitfImage::DataFitsFile() const
 {
     const uint64_t available = readLimit - dataOffset;
-    uint64_t bandBlock = uint64_t(NPPBH);
-    if (!MultiplyWithin(bandBlock, uint64_t(NPPBV), available) ||
-        !MultiplyWithin(bandBlock, uint64_t(bytesPerPixel), available))
+    const uint64_t bandBlock = BandBlockBytes();
+    if (bandBlock > available)
         return false;
     const bool bandsApart = IMODE() == 'S';
     uint64_t storedBlock = bandBlock;
@@ -207,7 +248,7 @@ void CNitfImage::AllocLineBuffer()
 {
     FreeVector(lineBuffer);
     if (isPrepared && compressionKind == kUncompressed)
-        lineBuffer.resize(size_t(NBANDS) * size_t(NPPBH) * size_t(bytesPerPixel));
+        lineBuffer.resize(size_t(IMODE() == 'P' ? NBANDS : 1) * size_t(NPPBH) * size_t(bytesPerPixel));
 }
 
 bool CNitfImage::OpenCompressed(CFileReader& reader, uint64_t dataLength)

@@ -10,6 +10,7 @@
 #include "imaging/LeadToolLibWrapper.h"
 #include "nitf/NitfBand.h"
 
+#include <cstddef>
 #include <cstdint>
 #include <memory>
 #include <vector>
@@ -39,6 +40,7 @@ constexpr unsigned kSubheaderFrontSize = 372;   // IM to ICORDS, NITF 2.1 positi
 constexpr unsigned kBlockingTextSize = 40;      // ISYNC to IMAG
 constexpr unsigned kIgeoloSize = 60;
 constexpr unsigned kCommentSize = 80;
+constexpr size_t kRgbBands = 3;
 
 class CNitfImage {
 public:
@@ -47,10 +49,14 @@ public:
     int32_t NPPBH = 0, NPPBV = 0;
     int32_t NBPP = 0;
     int32_t ABPP = 0;
-    int32_t bytesPerPixel = 0;      // NBPP / 8
+    int32_t bytesPerPixel = 0;      // NBPP / 8, rounded up: the bytes that hold one packed pixel's bits
     std::vector<uint8_t> lineBuffer;
     uint8_t isMono = 0;
     uint8_t isRgb = 0;              // also set for "RGB/LUT"
+    uint8_t isMulti = 0;
+    // The bands uncompressed rows show, in their order: R, G, B or one band.
+    int32_t drawnBands[kRgbBands] = {};
+    int32_t drawnBandCount = 0;
     int32_t compressionKind = kUncompressed;
     uint8_t isMasked = 0;
     std::vector<uint32_t> blockOffsets; // per block (per band and block in IMODE S), relative to dataOffset
@@ -88,6 +94,8 @@ public:
     // Whether the image is served; sets up the decoder for compressed kinds.
     bool PrepareData(CFileReader& reader, uint64_t dataLength);
     bool IsPaletted() const;
+    // Whether the palette holds colours (RGB/LUT tables), not grey values.
+    bool ColourPalette() const;
     // Bytes per pixel of the rows the host expects: one palette index, or R,G,B.
     uint32_t HostPixelBytes() const;
     int32_t GetPaletteSize() const;
@@ -137,6 +145,7 @@ private:
     bool ReadCorners(FileCursor& cursor);
     bool ReadCompression(FileCursor& cursor);
     bool ReadBands(FileCursor& cursor);
+    void ChooseDrawnBands();
     bool ReadBlocking(FileCursor& cursor);
     bool ReadExtensions(FileCursor& cursor);
     bool PlaceData(FileCursor& cursor, uint32_t offset);
@@ -146,6 +155,9 @@ private:
     // Data steps.
     bool ValidGeometry();
     bool ServesUncompressed() const;
+    bool IsRgbLut() const;
+    bool IsPacked() const;
+    bool OneBitIndices() const;
     bool DataFitsFile() const;
     bool PrepareJpegData(CFileReader& reader, uint64_t dataLength);
     bool IndexMaskedStreams();
@@ -153,6 +165,7 @@ private:
 
     // Line steps.
     uint32_t OutputPixelBytes() const;
+    bool DrawsEveryBandInOrder() const;
     bool ReadUncompressedBlock(CFileReader& reader, uint32_t block, uint32_t rowInBlock, uint32_t c0, uint32_t n,
                                uint8_t* out);
     // Scatters the band's span into out, or leaves its address in *deferred
@@ -160,6 +173,8 @@ private:
     bool ReadBandSpan(CFileReader& reader, uint64_t blockStart, uint32_t column, int32_t band, uint32_t rowInBlock,
                       uint32_t c0, uint32_t n, uint8_t* out, const uint8_t** deferred);
     void ScatterHeld(const uint8_t* const held[], uint32_t n, uint8_t* out) const;
+    bool ReadPackedSpan(CFileReader& reader, uint64_t planeStart, uint32_t rowInBlock, uint32_t c0, uint32_t n,
+                        int32_t drawn, uint8_t* out);
     BlockPlace StripPlace(uint64_t planeStart, uint32_t pixelBytes, uint32_t rowInBlock, uint32_t slot) const;
     bool ReadSpan(CFileReader& reader, const BlockPlace& place, uint64_t position, uint64_t count,
                   const uint8_t*& data);

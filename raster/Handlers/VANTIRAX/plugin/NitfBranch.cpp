@@ -62,7 +62,7 @@ int32_t CRasterHandler::NitfOpen(RHHandle* handle, CFileReader& reader, const CN
     handle->height = uint32_t(nitfImage.NROWS);
     handle->geoRef = CornerGeoRef(nitfImage, handle->width, handle->height);
     if (nitfImage.IsPaletted()) {
-        handle->pixelKind = nitfImage.isMono ? kPixelGreyPaletted : kPixelPaletted;
+        handle->pixelKind = nitfImage.ColourPalette() ? kPixelPaletted : kPixelGreyPaletted;
         handle->palette = ImagePalette(nitfImage);
     } else {
         handle->pixelKind = kPixelDirect;

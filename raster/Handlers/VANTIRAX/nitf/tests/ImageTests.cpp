@@ -3,6 +3,7 @@
 // the files of the shared corpus it serves, and files GDAL writes (NITF 2.1 and 2.0) from fixture files,
 // draw what GDAL decodes; their ICORDS, IGEOLO, palette and corners' EPSG code agree with GDAL's.
 #include "geo/ImageCorners.h"
+#include "nitf/tests/NitfTestFile.h"
 #include "nitf/NitfFileHeader.h"
 #include "nitf/NitfImage.h"
 #include "base/FileReader.h"
@@ -23,52 +24,6 @@
 #include <tuple>
 
 namespace {
-
-// A NITF file on disk, its file header and its first image subheader read the way the handler reads them.
-struct LoadedImage {
-    explicit LoadedImage(const std::string& bytes) : file(bytes, ".ntf"), path(file.path()) {}
-    explicit LoadedImage(const char* externalPath) : path(externalPath) {}
-
-    // Parses the file header and the first image subheader.
-    bool Parse()
-    {
-        header.SetPath(path.c_str());
-        if (!header.Parse() || header.NUMI < 1)
-            return false;
-        reader.OpenFile(path.c_str(), kShareDenyWrite);
-        return image.ReadSubheader(reader, header);
-    }
-    // Parse, PrepareData, AllocLineBuffer and OpenCompressed, as an open does.
-    bool Open()
-    {
-        if (!Parse() || !image.PrepareData(reader, header.imageSegments[0].dataLength))
-            return false;
-        image.AllocLineBuffer();
-        image.OpenCompressed(reader, header.imageSegments[0].dataLength);
-        return true;
-    }
-    // Columns first..last of a row (all when last is -1); empty when ReadLine fails.
-    std::vector<uint8_t> Row(uint32_t row, int32_t first = 0, int32_t last = -1)
-    {
-        last = last < 0 ? image.NCOLS - 1 : last;
-        std::vector<uint8_t> out(size_t(last - first + 1) * (image.NBANDS == 3 ? 3 : 1) + 1, 0xEE);
-        const bool read = image.ReadLine(reader, row, first, last, out.data());
-        EXPECT_EQ(out.back(), 0xEE) << "row " << row << ": wrote past column " << last;
-        out.pop_back();
-        return read ? out : std::vector<uint8_t>();
-    }
-
-    TempFile file{std::string(), ".ntf"};
-    std::string path;
-    CNitfImage image;
-    CNitfFileHeader header;
-    CFileReader reader;
-};
-
-uint64_t Ramp(int32_t band, int32_t row, int32_t column)
-{
-    return uint64_t(band * 100 + row * 7 + column) & 0xFF;
-}
 
 // A MONO image of rows x columns in NBPR x NBPC blocks of NPPBH x NPPBV (0: the image's), coded as IC says.
 NitfImagePlan Plan(int32_t rows, int32_t columns, const std::string& IC = "NC", int32_t NBPR = 1, int32_t NBPC = 1,
@@ -364,13 +319,11 @@ int32_t WorstDifference(LoadedImage& loaded)
 {
     const CNitfImage& image = loaded.image;
     const bool biLevel = image.compressionKind == kBiLevel;
-    const size_t bands = biLevel ? 1 : size_t(image.NBANDS), width = size_t(std::max(1, image.bytesPerPixel));
+    const size_t bands = image.HostPixelBytes(); // the bands drawnBands names, or the decoder's
     const int32_t significant = image.ABPP >= 1 && image.ABPP <= image.NBPP ? image.ABPP : image.NBPP;
-    TempDirectory dir; // GDAL's samples: band sequential, little-endian
-    RunCommand("gdal_translate -q -of ENVI '" + loaded.path + "' " + dir / "decoded.raw");
-    const std::string gdal = ReadWholeFile(dir / "decoded.raw");
+    const std::vector<uint32_t> gdal = GdalSamples(loaded.path, (image.NBPP + 7) / 8); // 12 bits in 2 bytes
     const size_t columns = size_t(image.NCOLS), plane = columns * size_t(image.NROWS);
-    if (gdal.size() < plane * bands * width)
+    if (gdal.size() < plane * size_t(image.NBANDS))
         return kNoOracle;
     int32_t worst = 0;
     for (size_t row = 0; row < size_t(image.NROWS); ++row) {
@@ -378,11 +331,9 @@ int32_t WorstDifference(LoadedImage& loaded)
         if (ours.empty())
             return kRowFailed;
         for (size_t i = 0; i < columns * bands; ++i) { // i: column x bands + band
-            const size_t at = (i % bands * plane + row * columns + i / bands) * width;
-            uint32_t expected = 0;
-            for (size_t b = 0; b < width; ++b)
-                expected |= uint32_t(uint8_t(gdal[at + b])) << (8 * b);
-            expected = width > 1 ? (expected >> (significant - 8)) & 0xFF : biLevel ? (expected ? 0 : 255) : expected;
+            const size_t band = image.drawnBandCount == int32_t(bands) ? size_t(image.drawnBands[i % bands]) : i % bands;
+            uint32_t expected = gdal[band * plane + row * columns + i / bands];
+            expected = image.NBPP > 8 ? (expected >> (significant - 8)) & 0xFF : biLevel ? (expected ? 0 : 255) : expected;
             worst = std::max(worst, std::abs(int32_t(ours[i]) - int32_t(expected)));
         }
     }

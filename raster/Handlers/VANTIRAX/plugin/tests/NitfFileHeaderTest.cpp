@@ -104,7 +104,7 @@ TEST(NitfFileHeader, RefusesWrongVersionsAndLengthsThatLie)
     // Other versions; FL larger or smaller than the file; a segment count running past the end
     // of the file whose FL still matches, or not a number; UDHDL of 1 or 2 (a negative data
     // size) or past the end of the file; XHDL 2.
-    for (const std::string& bad : {"NITF02.01" + rest, "NITF01.10" + rest, "NSIF01.00" + rest, "NITF03.00" + rest,
+    for (const std::string& bad : {"NITF02.01" + rest, "NITF01.10" + rest, "NSIF01.01" + rest, "NITF03.00" + rest,
                                    good.substr(0, good.size() - 1), good + "x", std::string(), std::string("NITF02.10"),
                                    good.substr(0, 360) + "999" + good.substr(363),
                                    good.substr(0, 360) + "-1x" + good.substr(363), declaring(1, -1), declaring(2, -1),
