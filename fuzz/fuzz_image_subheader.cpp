@@ -18,14 +18,17 @@ void ReadRows(CNitfImage& image, CFileReader& reader)
 {
     if (image.NCOLS < 1 || image.NROWS < 1)
         return;
-    const uint32_t width = uint32_t(image.NCOLS);
+    // Spans of at most the budget: a row of millions of pixels costs its
+    // decode, not the filling of a buffer that wide.
+    const auto width = uint32_t(std::min<uint64_t>(uint64_t(image.NCOLS), kPixelBudget));
     const uint64_t rows = std::min<uint64_t>(uint64_t(image.NROWS), kPixelBudget / width + 1);
     std::vector<uint8_t> row(size_t(width) * 3);
     for (uint32_t r = 0; r < rows; ++r)
         image.ReadLine(reader, r, 0, int32_t(width - 1), row.data());
-    // A span that starts and ends inside blocks.
+    // A span that starts and ends inside blocks, at the image's right edge.
     if (width > 2)
-        image.ReadLine(reader, uint32_t(image.NROWS - 1), 1, int32_t(width - 2), row.data());
+        image.ReadLine(reader, uint32_t(image.NROWS - 1), image.NCOLS - int32_t(width) + 1, image.NCOLS - 2,
+                       row.data());
 }
 
 } // namespace
