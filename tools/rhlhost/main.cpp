@@ -20,6 +20,7 @@
 
 #include <cstdio>
 #include <cstring>
+#include <filesystem>
 #include <string>
 #include <vector>
 
@@ -77,11 +78,17 @@ int Identify(const Exports& rh)
     return kExitOk;
 }
 
+// A file that is not there is answered 0 like any other, and is an error.
 int Probe(const Exports& rh, const std::vector<std::string>& files)
 {
-    for (const std::string& file : files)
+    int exitCode = kExitOk;
+    for (const std::string& file : files) {
         std::printf("%d %s\n", rh.isFormat(file.c_str()), file.c_str());
-    return kExitOk;
+        std::error_code error;
+        if (!std::filesystem::exists(file, error))
+            exitCode = Fail(kExitRefused, file + ": no such file");
+    }
+    return exitCode;
 }
 
 int Info(const Exports& rh, const std::string& path, bool asText)
@@ -138,6 +145,14 @@ int Run(const Exports& rh, const std::string& command, const CommandLine& line)
     return Fail(kExitUsage, kUsage);
 }
 
+bool IsCommand(const std::string& word)
+{
+    for (const char* command : {"identify", "probe", "info", "dump", "render", "mosaic"})
+        if (word == command)
+            return true;
+    return false;
+}
+
 } // namespace
 
 int main(int argc, char** argv)
@@ -151,6 +166,12 @@ int main(int argc, char** argv)
     if (next >= argc)
         return Fail(kExitUsage, kUsage);
     const std::string command = argv[next++];
+    if (command == "help" || command == "--help" || command == "-h") {
+        std::printf("%s\n", kUsage);
+        return kExitOk;
+    }
+    if (!IsCommand(command))
+        return Fail(kExitUsage, "unknown command " + command + "\n" + kUsage);
     CommandLine line;
     std::string message;
     if (!ParseCommandLine(std::vector<std::string>(argv + next, argv + argc), line, message))

@@ -5,7 +5,9 @@
 #include "tests/fixtures/NitfImageWriter.h"
 #include "tests/fixtures/RpfFrameWriter.h"
 
+#include <fcntl.h>
 #include <malloc.h>
+#include <unistd.h>
 #include <map>
 
 // Defined by the sanitizer runtimes only (gcc ships no header for it).
@@ -188,6 +190,34 @@ std::string OpenDrawClose(const HandlerExports& rh, const std::string& path, uin
     if (h.palette != nullptr)
         drawn.append(reinterpret_cast<const char*>(h.palette->entries), size_t(h.palette->entryCount) * 3);
     return drawn.append(pixels.begin(), pixels.end());
+}
+
+uint8_t LargeImagePixel(int32_t row, int32_t column)
+{
+    return uint8_t(row * 7 + column);
+}
+
+bool WriteSparseLargeImage(const std::string& path)
+{
+    constexpr size_t kFlOffset = 342, kLiOffset = 369; // FL (12 digits) and LI (10) of a NITF 2.1 file
+    NitfImagePlan plan;
+    plan.rows = kLargeImageRows;
+    plan.columns = plan.NPPBH = plan.NPPBV = kLargeImageSide;
+    plan.NBPC = kLargeImageRows / kLargeImageSide;
+    std::string header = BuildImageFile(plan, "");
+    const uint64_t dataBytes = uint64_t(kLargeImageSide) * uint64_t(kLargeImageRows);
+    header.replace(kFlOffset, 12, Digits(header.size() + dataBytes, 12));
+    header.replace(kLiOffset, 10, Digits(dataBytes, 10));
+    std::string lastRows;
+    for (int32_t row = kLargeImageRows - 2; row < kLargeImageRows; ++row)
+        for (int32_t column = 0; column < kLargeImageSide; ++column)
+            lastRows.push_back(char(LargeImagePixel(row, column)));
+    const int file = ::open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
+    const off_t end = off_t(header.size() + dataBytes);
+    const bool written = file >= 0 && ::pwrite(file, header.data(), header.size(), 0) == ssize_t(header.size()) &&
+                         ::pwrite(file, lastRows.data(), lastRows.size(), end - off_t(lastRows.size())) ==
+                             ssize_t(lastRows.size());
+    return (file < 0 || ::close(file) == 0) && written;
 }
 
 size_t HeapInUse()
