@@ -233,12 +233,7 @@ TEST(MemoryLimits, BiLevelImagesBeyondTheCapsOpenSmallAndFailTheirRows)
     for (const auto& [columns, rows, twoDimensional, decodes] :
          {std::tuple{99999999u, 100u, false, false}, {17000000u, 2u, true, false}, {1000000u, 2u, true, true}}) {
         SCOPED_TRACE(columns);
-        NitfImagePlan plan;
-        plan.columns = int32_t(columns);
-        plan.rows = int32_t(rows);
-        plan.NBPP = 1;
-        plan.IC = "C1";
-        plan.COMRAT = twoDimensional ? "2DS " : "1D  ";
+        const NitfImagePlan plan = BiLevelPlan(int32_t(columns), int32_t(rows), twoDimensional);
         const uint32_t coded = twoDimensional ? columns : 64;
         const std::vector<uint8_t> strip =
             EncodeT4Strip(std::vector<uint8_t>((coded + 7) / 8 * rows), coded, rows, twoDimensional);

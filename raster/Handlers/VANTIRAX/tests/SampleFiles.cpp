@@ -92,13 +92,7 @@ std::string BiLevel(bool twoDimensional, unsigned seed)
     std::vector<uint8_t> packed(size_t(kFaxWidth / 8) * kFaxHeight);
     for (size_t i = 0; i < packed.size(); ++i)
         packed[i] = uint8_t((i * 37 + seed * 11) ^ (i / 12));
-    NitfImagePlan plan;
-    plan.columns = int32_t(kFaxWidth);
-    plan.rows = int32_t(kFaxHeight);
-    plan.NBPP = 1;
-    plan.IC = "C1";
-    plan.COMRAT = twoDimensional ? "2DS " : "1D  ";
-    return BuildImageFile(plan, AsString(EncodeT4Strip(packed, kFaxWidth, kFaxHeight, twoDimensional)));
+    return BuildImageFile(BiLevelPlan(int32_t(kFaxWidth), int32_t(kFaxHeight), twoDimensional), AsString(EncodeT4Strip(packed, kFaxWidth, kFaxHeight, twoDimensional)));
 }
 
 } // namespace
