@@ -352,14 +352,15 @@ TEST_P(HostRender, GdalReadsWhatInfoAndDumpSay)
                 << "corner " << a << ", " << b;
         }
     // The dump's bytes, grey palettes mapped to their greys, sum as GDAL sums
-    // the TIFF's bands; the PNG shows colour palettes as their colours.
+    // the TIFF's bands; the PNG shows palettes as their colours, masked pixels transparent black.
     const bool paletted = r.colours[0] == "Palette";
     std::string dump = ReadWholeFile(directory / "dump.raw"), shown;
     for (char& value : dump) {
         if (r.colours[0] == "Gray" && !info.palette.empty())
             value = char(info.palette.at(uint8_t(value))[0]);
-        for (size_t c = 0; paletted && c < 3; ++c)
-            shown += char(info.palette.at(uint8_t(value))[c]);
+        const bool masked = r.nodata && uint8_t(value) == kRpfMaskedPixel;
+        for (size_t c = 0; paletted && c < 3u + r.nodata; ++c)
+            shown += masked ? '\0' : c == 3 ? '\xff' : char(info.palette.at(uint8_t(value))[c]);
     }
     const auto sums = [&](const std::string& pixels, size_t bands) {
         std::vector<uint32_t> sums;
@@ -368,7 +369,7 @@ TEST_P(HostRender, GdalReadsWhatInfoAndDumpSay)
         return sums;
     };
     EXPECT_EQ(gdal.checksums, sums(dump, r.colours.size()));
-    EXPECT_EQ(ReadWithGdal(png).checksums, paletted ? sums(shown, 3) : gdal.checksums);
+    EXPECT_EQ(ReadWithGdal(png).checksums, paletted ? sums(shown, 3u + r.nodata) : gdal.checksums);
     EXPECT_EQ(gdal.hasNodata, r.nodata);
     EXPECT_TRUE(!r.nodata || gdal.nodata == kRpfMaskedPixel);
     for (size_t i = 0; paletted && i < info.palette.size(); ++i)
@@ -380,7 +381,7 @@ const std::vector<std::string> kPalette = {"Palette"}, kGray = {"Gray"}, kRgb = 
 INSTANTIATE_TEST_SUITE_P(Samples, HostRender,
                          testing::Values(Rendering{"cadrg_big_endian", "", kPalette, true},
                                          Rendering{"cadrg_big_endian", "100,200,400,300", kPalette, true},
-                                         Rendering{"cib", "", kGray, false},
+                                         Rendering{"cib", "", kPalette, true},
                                          Rendering{"lookup_table", "", kPalette, false},
                                          Rendering{"rgb_row_utm", "", kRgb, false},
                                          Rendering{"rgb_pixel_decimal", "33,5,80,69", kRgb, false},
