@@ -177,6 +177,9 @@ const Command kCommands[] = {
       "308 files: 5 rendered (1 with 32 undecodable rows), 303 refused (302 not recognised, 1 not opened, 0 vanished), "
       "0 failed to write"},
      {"frame.ntf.tif", "rotated.ntf.tif", "rows_fail.ntf.tif", "utm.ntf.tif", "z_coarse.ntf.tif"}},
+    {{"render", "--jobs", "2", "-o", "OUT", "IN/frame.ntf", "IN/./frame.ntf", "IN/frame.ntf-2"}, 0,
+     {"IN/./frame.ntf: written as frame.ntf-3.tif, frame.ntf.tif being another input's", "3 files: 2 rendered"},
+     {"frame.ntf-3.tif", "frame.ntf.tif"}},
     {{"dump", "IN/frame.ntf", "OUT/frame.raw", "--window", "0,0,10,20"}, 0, {}, {"frame.raw"}},
     {{"mosaic", "-o", "OUT/m.tif", "IN/utm.ntf"}, 1, {"no frame to place in the mosaic"}, {}},
     {{"mosaic", "-o", "OUT/m.tif", "IN"}, 1,
@@ -199,7 +202,7 @@ TEST(HostCommands, ExitSayAndLeave)
                                        {"rows_fail", "jpeg_streams_larger_than_blocks"},
                                        {"broken", "rpf_sections_missing"}})
         WriteFile(in / file + ".ntf", SampleBytes(sample));
-    WriteFile(in / "cut.ntf", SampleBytes("rgb_row_utm").substr(0, 5000));
+    WriteFile(in / "frame.ntf-2", SampleBytes("rgb_row_utm").substr(0, 5000)); // cut short
     WriteFile(in / "notes.txt", "not an image");
     fs::create_directories(in / "junk");
     for (int i = 0; i < 300; ++i)
