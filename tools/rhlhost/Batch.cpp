@@ -27,7 +27,8 @@ bool Exists(const std::string& path)
 class Batch {
 public:
     Batch(const Exports& rh, const BatchOptions& options, std::vector<InputFile> files)
-        : rh_(rh), options_(options), files_(std::move(files)), outcomes_(files_.size()), progress_(files_.size())
+        : rh_(rh), options_(options), files_(std::move(files)), names_(UniqueNames(files_)),
+          outcomes_(files_.size()), progress_(files_.size())
     {
     }
 
@@ -48,26 +49,26 @@ private:
     void Work()
     {
         for (size_t i = next_++; i < files_.size(); i = next_++) {
-            outcomes_[i] = Process(files_[i]);
+            outcomes_[i] = Process(files_[i], names_[i]);
             progress_.Advance();
         }
     }
 
-    FileOutcome Process(const InputFile& file)
+    FileOutcome Process(const InputFile& file, const std::string& name)
     {
         if (rh_.isFormat(file.path.c_str()) != 1)
             return Exists(file.path) ? FileOutcome{FileResult::NotRecognised, 0} : Vanished(file);
-        const fs::path output = fs::path(options_.outputDirectory) / (file.name + options_.extension);
+        const fs::path output = fs::path(options_.outputDirectory) / (name + options_.extension);
         std::error_code error;
         fs::create_directories(output.parent_path(), error);
         if (error) {
             progress_.Report("cannot create the directory " + output.parent_path().string() + ": " + error.message());
             return {FileResult::Failed, 0};
         }
-        return Rendered(file, RenderFile(rh_, file.path, output.string(), format_, options_.window));
+        return Rendered(file, name, RenderFile(rh_, file.path, output.string(), format_, options_.window));
     }
 
-    FileOutcome Rendered(const InputFile& file, const RenderOutcome& outcome)
+    FileOutcome Rendered(const InputFile& file, const std::string& name, const RenderOutcome& outcome)
     {
         if (!outcome.warning.empty())
             progress_.Report(file.path + ": " + outcome.warning);
@@ -81,6 +82,9 @@ private:
             progress_.Report(file.path + ": " + outcome.message);
             return {FileResult::NotOpened, 0};
         }
+        if (name != file.name)
+            progress_.Report(file.path + ": written as " + name + options_.extension + ", " + file.name +
+                             options_.extension + " being another input's");
         if (outcome.failedRows > 0)
             progress_.Report(file.path + ": " + std::to_string(outcome.failedRows) +
                              " rows could not be decoded (written as zeros)");
@@ -96,6 +100,7 @@ private:
     const Exports& rh_;
     const BatchOptions& options_;
     const std::vector<InputFile> files_;
+    const std::vector<std::string> names_; // unique output names
     std::vector<FileOutcome> outcomes_;
     Progress progress_;
     const OutputFormat format_ = options_.extension == ".png" ? OutputFormat::Png : OutputFormat::GeoTiff;

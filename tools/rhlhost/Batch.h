@@ -1,7 +1,8 @@
 // Renders many files on worker threads, one handle per file: every file the
 // handler recognises goes to OUTDIR/NAME.tif (or .png), NAME being its path
-// relative to the directory it was found in. A refused, damaged or vanished
-// file is reported and skipped; it never stops the batch.
+// relative to the directory it was found in, made unique (UniqueNames) before
+// any worker starts, so that no output of the run replaces another. A refused,
+// damaged or vanished file is reported and skipped; it never stops the batch.
 #pragma once
 
 #include "CommandLine.h"

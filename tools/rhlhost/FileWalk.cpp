@@ -1,7 +1,10 @@
 #include "FileWalk.h"
 
 #include <algorithm>
+#include <cctype>
 #include <filesystem>
+#include <map>
+#include <set>
 
 namespace host {
 namespace {
@@ -25,6 +28,12 @@ void WalkDirectory(const fs::path& root, std::vector<InputFile>& files, std::vec
               [](const InputFile& a, const InputFile& b) { return a.path < b.path; });
 }
 
+std::string Folded(std::string name)
+{
+    std::transform(name.begin(), name.end(), name.begin(), [](unsigned char c) { return std::tolower(c); });
+    return name;
+}
+
 } // namespace
 
 std::vector<InputFile> CollectInputs(const std::vector<std::string>& inputs, std::vector<std::string>& problems)
@@ -38,6 +47,24 @@ std::vector<InputFile> CollectInputs(const std::vector<std::string>& inputs, std
             files.push_back({input, fs::path(input).filename().string()});
     }
     return files;
+}
+
+std::vector<std::string> UniqueNames(const std::vector<InputFile>& files)
+{
+    std::set<std::string> own, given;
+    for (const InputFile& file : files)
+        own.insert(Folded(file.name));
+    std::map<std::string, size_t> nextSuffix;
+    std::vector<std::string> names;
+    for (const InputFile& file : files) {
+        std::string name = file.name;
+        size_t& suffix = nextSuffix.emplace(Folded(name), 2).first->second;
+        while (given.count(Folded(name)) > 0 || (name != file.name && own.count(Folded(name)) > 0))
+            name = file.name + "-" + std::to_string(suffix++);
+        given.insert(Folded(name));
+        names.push_back(std::move(name));
+    }
+    return names;
 }
 
 } // namespace host

@@ -17,4 +17,10 @@ struct InputFile {
 // the caller reports it. Directories that cannot be read become problems.
 std::vector<InputFile> CollectInputs(const std::vector<std::string>& inputs, std::vector<std::string>& problems);
 
+// The files' names made unique, in the files' order: a name claimed a second
+// time becomes the first free NAME-2, NAME-3, ..., never another file's own
+// name. Names that differ only in case are one name: an output folder may
+// ignore case.
+std::vector<std::string> UniqueNames(const std::vector<InputFile>& files);
+
 } // namespace host

@@ -13,9 +13,6 @@
 namespace host {
 namespace {
 
-constexpr size_t kMaxPaletteEntries = 256;
-constexpr uint8_t kOpaque = 255;
-
 // The palette every frame shares, or empty when they differ or have none.
 std::vector<uint8_t> SharedPalette(const std::vector<MosaicFrame>& frames)
 {

@@ -9,6 +9,18 @@
 namespace host {
 namespace {
 
+int ColourType(unsigned channels)
+{
+    switch (channels) {
+    case 3:
+        return PNG_COLOR_TYPE_RGB;
+    case 4:
+        return PNG_COLOR_TYPE_RGB_ALPHA;
+    default:
+        return PNG_COLOR_TYPE_GRAY;
+    }
+}
+
 // libpng reports errors by longjmp; no C++ object with a destructor lives
 // across the setjmp in this function.
 bool WriteRows(FILE* file, uint32_t width, uint32_t height, unsigned channels, const uint8_t* pixels)
@@ -22,7 +34,7 @@ bool WriteRows(FILE* file, uint32_t width, uint32_t height, unsigned channels, c
         return false;
     }
     png_init_io(png, file);
-    png_set_IHDR(png, info, width, height, 8, channels == 3 ? PNG_COLOR_TYPE_RGB : PNG_COLOR_TYPE_GRAY,
+    png_set_IHDR(png, info, width, height, 8, ColourType(channels),
                  PNG_INTERLACE_NONE, PNG_COMPRESSION_TYPE_DEFAULT, PNG_FILTER_TYPE_DEFAULT);
     png_write_info(png, info);
     const size_t rowBytes = size_t(width) * channels;

@@ -1,4 +1,4 @@
-// Writes 8-bit RGB or grey PNG files through libpng.
+// Writes 8-bit grey, RGB or RGBA PNG files through libpng.
 #pragma once
 
 #include <cstdint>
@@ -7,7 +7,7 @@
 
 namespace host {
 
-// pixels: height rows of width x channels bytes (channels 1 or 3). False with the reason.
+// pixels: height rows of width x channels bytes (channels 1, 3 or 4). False with the reason.
 bool WritePng(const std::string& path, uint32_t width, uint32_t height, unsigned channels,
               const std::vector<uint8_t>& pixels, std::string& message);
 

@@ -6,8 +6,6 @@
 namespace host {
 namespace {
 
-constexpr size_t kMaxPaletteEntries = 256;
-
 bool AllGrey(const std::vector<uint8_t>& palette)
 {
     for (size_t i = 0; i + 2 < palette.size(); i += 3)
@@ -54,7 +52,9 @@ Raster RasterFromPixels(const OpenedImage& image, const Pixels& pixels)
     if (image.palette.empty())
         return raster;
     const size_t entries = image.palette.size() / 3;
-    if (AllGrey(image.palette)) {
+    // An RPF frame stays paletted even when grey: its entry 216 is the masked value, not a grey level.
+    const int masked = MaskedIndex(image.palette);
+    if (masked == kNoNodata && AllGrey(image.palette)) {
         for (uint8_t& value : raster.pixels)
             value = image.palette[EntryOf(value, entries) * 3];
         return raster;
@@ -62,7 +62,7 @@ Raster RasterFromPixels(const OpenedImage& image, const Pixels& pixels)
     raster.colour = Colour::Palette;
     raster.palette.assign(image.palette.begin(),
                           image.palette.begin() + std::min(entries, kMaxPaletteEntries) * 3);
-    raster.nodata = MaskedIndex(image.palette);
+    raster.nodata = masked;
     return raster;
 }
 
@@ -71,13 +71,18 @@ Raster Expanded(const Raster& raster)
     if (raster.colour != Colour::Palette)
         return raster;
     Raster rgb = raster;
-    rgb.colour = Colour::Rgb;
+    rgb.colour = raster.nodata == kNoNodata ? Colour::Rgb : Colour::Rgba;
     rgb.palette.clear();
     rgb.nodata = kNoNodata;
-    const size_t entries = raster.palette.size() / 3;
-    rgb.pixels.resize(raster.pixels.size() * 3);
-    for (size_t i = 0; i < raster.pixels.size(); ++i)
-        std::memcpy(&rgb.pixels[i * 3], &raster.palette[EntryOf(raster.pixels[i], entries) * 3], 3);
+    const size_t entries = raster.palette.size() / 3, samples = rgb.Samples();
+    rgb.pixels.assign(raster.pixels.size() * samples, 0);
+    for (size_t i = 0; i < raster.pixels.size(); ++i) {
+        if (raster.pixels[i] == raster.nodata)
+            continue; // transparent black, as a mosaic leaves masked pixels
+        std::memcpy(&rgb.pixels[i * samples], &raster.palette[EntryOf(raster.pixels[i], entries) * 3], 3);
+        if (samples == 4)
+            rgb.pixels[i * 4 + 3] = kOpaque;
+    }
     return rgb;
 }
 

@@ -15,6 +15,8 @@ enum class Colour { Grey, Palette, Rgb, Rgba };
 constexpr size_t kRpfPaletteEntries = 217;
 constexpr int kRpfMaskedIndex = 216;
 constexpr int kNoNodata = -1;
+constexpr size_t kMaxPaletteEntries = 256;
+constexpr uint8_t kOpaque = 255; // alpha
 
 struct Raster {
     uint32_t width = 0, height = 0;
@@ -29,11 +31,13 @@ struct Raster {
 // The palette index that means "masked" (the RPF frame's entry 216), or kNoNodata.
 int MaskedIndex(const std::vector<uint8_t>& palette);
 
-// Colour palettes keep their indices and colour map; palettes whose entries are
-// all grey become grey values; RGB rows stay RGB; rows without palette are grey.
+// Colour palettes and every RPF frame's palette keep their indices and colour
+// map; other palettes whose entries are all grey become grey values; RGB rows
+// stay RGB; rows without palette are grey.
 Raster RasterFromPixels(const OpenedImage& image, const Pixels& pixels);
 
-// Palette indices replaced by their colours, for formats written without a colour map.
+// Palette indices replaced by their colours, for formats written without a
+// colour map; with a nodata index, RGBA with the masked pixels transparent.
 Raster Expanded(const Raster& raster);
 
 } // namespace host

@@ -177,6 +177,9 @@ const Command kCommands[] = {
       "308 files: 5 rendered (1 with 32 undecodable rows), 303 refused (302 not recognised, 1 not opened, 0 vanished), "
       "0 failed to write"},
      {"frame.ntf.tif", "rotated.ntf.tif", "rows_fail.ntf.tif", "utm.ntf.tif", "z_coarse.ntf.tif"}},
+    {{"render", "--jobs", "2", "-o", "OUT", "IN/frame.ntf", "IN/./frame.ntf", "IN/frame.ntf-2"}, 0,
+     {"IN/./frame.ntf: written as frame.ntf-3.tif, frame.ntf.tif being another input's", "3 files: 2 rendered"},
+     {"frame.ntf-3.tif", "frame.ntf.tif"}},
     {{"dump", "IN/frame.ntf", "OUT/frame.raw", "--window", "0,0,10,20"}, 0, {}, {"frame.raw"}},
     {{"mosaic", "-o", "OUT/m.tif", "IN/utm.ntf"}, 1, {"no frame to place in the mosaic"}, {}},
     {{"mosaic", "-o", "OUT/m.tif", "IN"}, 1,
@@ -199,7 +202,7 @@ TEST(HostCommands, ExitSayAndLeave)
                                        {"rows_fail", "jpeg_streams_larger_than_blocks"},
                                        {"broken", "rpf_sections_missing"}})
         WriteFile(in / file + ".ntf", SampleBytes(sample));
-    WriteFile(in / "cut.ntf", SampleBytes("rgb_row_utm").substr(0, 5000));
+    WriteFile(in / "frame.ntf-2", SampleBytes("rgb_row_utm").substr(0, 5000)); // cut short
     WriteFile(in / "notes.txt", "not an image");
     fs::create_directories(in / "junk");
     for (int i = 0; i < 300; ++i)
@@ -352,14 +355,15 @@ TEST_P(HostRender, GdalReadsWhatInfoAndDumpSay)
                 << "corner " << a << ", " << b;
         }
     // The dump's bytes, grey palettes mapped to their greys, sum as GDAL sums
-    // the TIFF's bands; the PNG shows colour palettes as their colours.
+    // the TIFF's bands; the PNG shows palettes as their colours, masked pixels transparent black.
     const bool paletted = r.colours[0] == "Palette";
     std::string dump = ReadWholeFile(directory / "dump.raw"), shown;
     for (char& value : dump) {
         if (r.colours[0] == "Gray" && !info.palette.empty())
             value = char(info.palette.at(uint8_t(value))[0]);
-        for (size_t c = 0; paletted && c < 3; ++c)
-            shown += char(info.palette.at(uint8_t(value))[c]);
+        const bool masked = r.nodata && uint8_t(value) == kRpfMaskedPixel;
+        for (size_t c = 0; paletted && c < 3u + r.nodata; ++c)
+            shown += masked ? '\0' : c == 3 ? '\xff' : char(info.palette.at(uint8_t(value))[c]);
     }
     const auto sums = [&](const std::string& pixels, size_t bands) {
         std::vector<uint32_t> sums;
@@ -368,7 +372,7 @@ TEST_P(HostRender, GdalReadsWhatInfoAndDumpSay)
         return sums;
     };
     EXPECT_EQ(gdal.checksums, sums(dump, r.colours.size()));
-    EXPECT_EQ(ReadWithGdal(png).checksums, paletted ? sums(shown, 3) : gdal.checksums);
+    EXPECT_EQ(ReadWithGdal(png).checksums, paletted ? sums(shown, 3u + r.nodata) : gdal.checksums);
     EXPECT_EQ(gdal.hasNodata, r.nodata);
     EXPECT_TRUE(!r.nodata || gdal.nodata == kRpfMaskedPixel);
     for (size_t i = 0; paletted && i < info.palette.size(); ++i)
@@ -380,7 +384,7 @@ const std::vector<std::string> kPalette = {"Palette"}, kGray = {"Gray"}, kRgb = 
 INSTANTIATE_TEST_SUITE_P(Samples, HostRender,
                          testing::Values(Rendering{"cadrg_big_endian", "", kPalette, true},
                                          Rendering{"cadrg_big_endian", "100,200,400,300", kPalette, true},
-                                         Rendering{"cib", "", kGray, false},
+                                         Rendering{"cib", "", kPalette, true},
                                          Rendering{"lookup_table", "", kPalette, false},
                                          Rendering{"rgb_row_utm", "", kRgb, false},
                                          Rendering{"rgb_pixel_decimal", "33,5,80,69", kRgb, false},
