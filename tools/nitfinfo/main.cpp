@@ -36,8 +36,8 @@ int main(int argc, char** argv)
         if (std::strcmp(argv[i], "--json") == 0)
             json = true;
         else if (argv[i][0] == '-' && argv[i][1] != '\0') {
-            std::fprintf(stderr, "nitfinfo: unknown option %s\n%s", PrintableText(argv[i], std::strlen(argv[i])).c_str(),
-                         kUsage);
+            const std::string option = PrintableText(argv[i], std::strlen(argv[i]));
+            std::fprintf(stderr, "nitfinfo: unknown option %s\n%s", option.c_str(), kUsage);
             return kExitBadArguments;
         } else
             paths.push_back(argv[i]);

@@ -110,12 +110,12 @@ TEST(NitfInfo, FieldsAgreeWithGdal)
         const Outcome run = RunInfo("--json '" + path + "'");
         ASSERT_EQ(run.exitCode, 0) << run.err;
         std::map<std::string, std::string> gdal = GdalFields(path);
-        for (const char* name : {"FHDR", "FTITLE", "FSCLAS", "IID1", "IDATIM", "ICAT", "ISORCE", "IC", "IREP", "IMODE",
-                                 "PVTYPE", "IGEOLO"})
-            EXPECT_EQ(Ours(run.out, name), gdal.count("NITF_" + std::string(name)) ? gdal["NITF_" + std::string(name)] : "-")
-                << name;
+        for (const std::string name : {"FHDR", "FTITLE", "FSCLAS", "IID1", "IDATIM", "ICAT", "ISORCE", "IC", "IREP",
+                                       "IMODE", "PVTYPE", "IGEOLO"})
+            EXPECT_EQ(Ours(run.out, name), gdal.count("NITF_" + name) ? gdal["NITF_" + name] : "-") << name;
         // A NITF 2.0 ICORDS "N" (no corners) is kept as a blank.
-        EXPECT_EQ(Ours(run.out, "ICORDS"), gdal["NITF_ICORDS"] == "N" && Ours(run.out, "FHDR") == "NITF02.00" ? "" : gdal["NITF_ICORDS"]);
+        const bool noCorners20 = gdal["NITF_ICORDS"] == "N" && Ours(run.out, "FHDR") == "NITF02.00";
+        EXPECT_EQ(Ours(run.out, "ICORDS"), noCorners20 ? "" : gdal["NITF_ICORDS"]);
         EXPECT_EQ(std::stoi(Ours(run.out, "ABPP")), std::stoi(gdal["NITF_ABPP"]));
         EXPECT_EQ(Ours(run.out, "NCOLS") + "x" + Ours(run.out, "NROWS"), gdal["size"]);
         EXPECT_EQ(Ours(run.out, "NBANDS"), gdal["bands"]);
@@ -126,9 +126,10 @@ TEST(NitfInfo, FieldsAgreeWithGdal)
         const std::string series = Ours(run.out, "series"), abbreviation = gdal["NITF_SERIES_ABBREVIATION"];
         std::smatch metres;
         if (gdal.count("NITF_SERIES_NAME"))
-            EXPECT_TRUE(abbreviation.empty() ? std::regex_match(series, metres, std::regex("CIB ([0-9.]+) m")) &&
-                                                   gdal["NITF_SERIES_NAME"].find(metres[1].str() + " meter") != std::string::npos
-                                             : series.rfind(abbreviation + " ", 0) == 0)
+            EXPECT_TRUE(abbreviation.empty()
+                            ? std::regex_match(series, metres, std::regex("CIB ([0-9.]+) m")) &&
+                                  gdal["NITF_SERIES_NAME"].find(metres[1].str() + " meter") != std::string::npos
+                            : series.rfind(abbreviation + " ", 0) == 0)
                 << series << " / " << gdal["NITF_SERIES_NAME"];
         else
             EXPECT_EQ(series, "-");
@@ -155,7 +156,8 @@ TEST(NitfInfo, ExitCodesMessagesAndUntrustedText)
         {folder / "missing.ntf " + good, 1, 1, "FTITLE      fixture", "missing.ntf: no such file\n"},
         {folder.path() + " " + text, 1, 2, "", "a directory, not a file\nnitfinfo: " + text + ": not a NITF"},
         {odd, 0, 0, "FTITLE      ?\"\\???e\n", ""},
-        {"--json " + odd + " " + text + " " + good, 1, 1, R"("FTITLE": "?\"\\???e", "FSCLAS": "U")", "text.ntf: not a NITF"},
+        {"--json " + odd + " " + text + " " + good, 1, 1, R"("FTITLE": "?\"\\???e", "FSCLAS": "U")",
+         "text.ntf: not a NITF"},
     };
     for (const auto& row : cases) {
         SCOPED_TRACE(row.arguments);
