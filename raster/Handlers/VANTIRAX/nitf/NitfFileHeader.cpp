@@ -11,7 +11,6 @@ namespace {
 
 constexpr uint64_t kFixedLengthOffset = 342;   // FL in NITF 2.1 and NITF 2.0 without FSDEVT
 constexpr uint64_t kShiftedLengthOffset = 382; // FL in NITF 2.0 whose FSDWNG is 999998
-constexpr unsigned kVersionTextSize = 9;       // FHDR and FVER: "NITF02.10", "NITF02.00" or "NSIF01.00"
 constexpr unsigned kFileLengthWidth = 12;
 constexpr unsigned kHeaderLengthWidth = 6;
 constexpr unsigned kCountWidth = 3;
@@ -116,7 +115,8 @@ bool CNitfFileHeader::Parse()
         uint64_t fileSize = reader.FileSize();
         FileCursor cursor(reader, fileSize);
 
-        if (!cursor.Read(headerText, kVersionTextSize))
+        // The whole front is read at once: a file shorter than it has no FL anyway.
+        if (!cursor.Read(headerText, sizeof headerText))
             return false;
         // NSIF 1.0 is laid out as NITF 2.1.
         if (VersionIs(headerText, "NITF02.10") || VersionIs(headerText, "NSIF01.00"))

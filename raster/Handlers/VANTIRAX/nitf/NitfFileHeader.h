@@ -16,7 +16,7 @@ constexpr uint32_t kNoUserHeader = 0xFFFFFFFF;
 class CNitfFileHeader {
 public:
     std::string path;                   // set by the caller before Parse
-    char headerText[342] = {};          // only FHDR and FVER (9 characters) are read
+    char headerText[342] = {};          // FHDR to OPHONE (NITF 2.0 with FSDEVT: to FSCOP) as read
     char lengthText[18] = {};           // FL (12) and HL (6) as last read
     int32_t NUMI = 0;
     NitfSegmentLength* imageSegments = nullptr;
@@ -57,4 +57,9 @@ public:
 
     // True when UDHD holds the RPFHDR extension of an RPF frame.
     bool HasRpfHeader() const;
+
+    // FTITLE (80 characters) and FSCLAS lie at the same positions in NITF 2.0 and 2.1.
+    static constexpr unsigned kFtitleWidth = 80;
+    const char* FTITLE() const { return headerText + 39; }
+    char FSCLAS() const { return headerText[119]; }
 };
