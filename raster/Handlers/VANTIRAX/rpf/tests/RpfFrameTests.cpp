@@ -32,11 +32,13 @@ struct OpenedFrame {
     std::vector<uint8_t> Line(uint32_t row, uint32_t first = 0, uint32_t last = kRpfFrameSide - 1)
     {
         std::vector<uint8_t> line(last - first + 2, 0xEE);
-        reader.PrepareDraw(last - first + 1);
-        const bool read = reader.ReadLine(drawReader, row, first, last, line.data());
+        // A draw as wide as the frame: spans outside it or reversed must be
+        // refused by ReadLine itself, not by a code buffer too small for them.
+        reader.PrepareDraw(std::max(last - first + 1, kRpfFrameSide));
+        lineRead = reader.ReadLine(drawReader, row, first, last, line.data());
         EXPECT_EQ(line.back(), 0xEE) << "row " << row << ": wrote past column " << last;
         line.pop_back();
-        return read ? line : std::vector<uint8_t>();
+        return lineRead ? line : std::vector<uint8_t>();
     }
     std::vector<uint8_t> All()
     {
@@ -52,6 +54,7 @@ struct OpenedFrame {
     CFileReader openReader{0}, drawReader{0};
     CRpfFrameReader reader;
     bool opened = false;
+    bool lineRead = false; // whether the last Line was read
 };
 
 using L = RpfFrameLayout;
@@ -84,10 +87,10 @@ TEST(RpfBadInput, RefusedAtOpenOrOnlyTheLinesTheDamageMeets)
         {"cut in the third subframe", {}, true, {{0, 0, 767, true}, {30, 0, 767, false}, {0, 0, 1535, false},
          {1, 0, 511, true}}, {}, at.spatialData + 2 * kRpfSubframeBytes + 500},
         // Spans in a code, across codes and subframes, whole rows, in masked subframe 3; outside or reversed.
-        {"undamaged", {}, true, {{5, 1, 10, true}, {6, 2, 2, true}, {7, 3, 4, true}, {8, 0, 3, true},
+        {"undamaged", {}, true, {{0, 10, 9, false}, {5, 1, 10, true}, {6, 2, 2, true}, {7, 3, 4, true}, {8, 0, 3, true},
           {255, 250, 262, true}, {256, 255, 256, true}, {1535, 0, 1535, true}, {1000, 1535, 1535, true},
           {77, 511, 1029, true}, {9, 600, 1100, true}, {3, 780, 790, true}, {1536, 0, 10, false},
-          {0, 0, 1536, false}, {0, 10, 9, false}}},
+          {0, 0, 1536, false}}},
         {"0 rows", {{display, 0, 0, 4}}, false}, {"0 codes a row", {{display, 4, 0, 4}}, false},
         {"2^30 codes a row", {{display, 4, 0x40000000, 4}}, false}, {"kernel width 0", {{image, 12, 2, 4}}, false},
         {"kernel height 0", {{image, 16, 3, 4}}, false}, {"part kernels", {{image, 12, 258, 4}}, false},
@@ -148,6 +151,7 @@ TEST(RpfBadInput, RefusedAtOpenOrOnlyTheLinesTheDamageMeets)
             const std::vector<uint8_t> undamaged(from + line.first, from + (line.decodes ? line.last + 1 : line.first));
             EXPECT_EQ(opened.Line(line.row, line.first, line.last), undamaged)
                 << c.what << ": row " << line.row << " columns " << line.first << ".." << line.last;
+            EXPECT_EQ(opened.lineRead, line.decodes) << c.what << ": row " << line.row; // a reversed span draws nothing
         }
         if (c.alsoCheck)
             c.alsoCheck(opened);
