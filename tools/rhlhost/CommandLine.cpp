@@ -1,6 +1,7 @@
 #include "CommandLine.h"
 
 #include <cstdio>
+#include <set>
 
 namespace host {
 namespace {
@@ -43,18 +44,54 @@ bool ApplyOption(const std::vector<std::string>& args, size_t& i, CommandLine& l
     return false;
 }
 
+// Which options each command takes; render takes --jobs and --format only
+// with -o, as a batch.
+bool Applies(const std::string& command, const std::string& option, bool batch)
+{
+    if (command == "info")
+        return option == "--text";
+    if (command == "dump")
+        return option == "--window";
+    if (command == "render")
+        return option == "--window" || option == "-o" || (batch && (option == "--jobs" || option == "--format"));
+    if (command == "mosaic")
+        return option == "-o";
+    return false;
+}
+
 } // namespace
 
-bool ParseCommandLine(const std::vector<std::string>& args, CommandLine& line, std::string& message)
+bool ParseCommandLine(const std::string& command, const std::vector<std::string>& args, CommandLine& line,
+                      std::string& message)
 {
-    for (size_t i = 0; i < args.size(); ++i) {
-        if (args[i].size() > 1 && args[i][0] == '-') {
-            if (!ApplyOption(args, i, line, message))
-                return false;
+    std::vector<std::string> words;
+    for (const std::string& arg : args) {
+        const size_t equals = arg.find('=');
+        if (arg.rfind("--", 0) == 0 && equals != std::string::npos) {
+            words.push_back(arg.substr(0, equals));
+            words.push_back(arg.substr(equals + 1));
         } else {
-            line.positional.push_back(args[i]);
+            words.push_back(arg);
         }
     }
+    std::set<std::string> given;
+    for (size_t i = 0; i < words.size(); ++i) {
+        if (words[i].size() > 1 && words[i][0] == '-') {
+            if (!given.insert(words[i]).second) {
+                message = words[i] + " is given twice";
+                return false;
+            }
+            if (!ApplyOption(words, i, line, message))
+                return false;
+        } else {
+            line.positional.push_back(words[i]);
+        }
+    }
+    for (const std::string& option : given)
+        if (!Applies(command, option, given.count("-o") != 0)) {
+            message = option + " does not apply to " + command + (command == "render" ? " without -o" : "");
+            return false;
+        }
     return true;
 }
 

@@ -17,7 +17,10 @@ struct CommandLine {
     bool text = false;           // --text
 };
 
-// False with a message on an unknown option or a bad value.
-bool ParseCommandLine(const std::vector<std::string>& args, CommandLine& line, std::string& message);
+// The options of command, each "--name value" or "--name=value". False with
+// a message on an unknown option, a bad value, an option given twice or one
+// that does not apply to the command.
+bool ParseCommandLine(const std::string& command, const std::vector<std::string>& args, CommandLine& line,
+                      std::string& message);
 
 } // namespace host

@@ -140,8 +140,12 @@ int Run(const Exports& rh, const std::string& command, const CommandLine& line)
         return Info(rh, args[0], line.text);
     if (command == "dump" || command == "render")
         return Render(rh, line, command == "dump");
-    if (command == "mosaic" && !args.empty() && !line.output.empty())
+    if (command == "mosaic" && !args.empty() && !line.output.empty()) {
+        OutputFormat format = OutputFormat::Raw;
+        if (!FormatFromName(line.output, format) || format != OutputFormat::GeoTiff)
+            return Fail(kExitUsage, "mosaic writes .tif or .tiff files");
         return RunMosaic(rh, args, line.output);
+    }
     return Fail(kExitUsage, kUsage);
 }
 
@@ -174,7 +178,7 @@ int main(int argc, char** argv)
         return Fail(kExitUsage, "unknown command " + command + "\n" + kUsage);
     CommandLine line;
     std::string message;
-    if (!ParseCommandLine(std::vector<std::string>(argv + next, argv + argc), line, message))
+    if (!ParseCommandLine(command, std::vector<std::string>(argv + next, argv + argc), line, message))
         return Fail(kExitUsage, message);
 
     Exports rh{};
