@@ -56,8 +56,14 @@ private:
 
     FileOutcome Process(const InputFile& file, const std::string& name)
     {
-        if (rh_.isFormat(file.path.c_str()) != 1)
-            return Exists(file.path) ? FileOutcome{FileResult::NotRecognised, 0} : Vanished(file);
+        if (rh_.isFormat(file.path.c_str()) != 1) {
+            if (!Exists(file.path))
+                return Vanished(file);
+            if (!file.named)
+                return {FileResult::NotRecognised, 0};
+            progress_.Report(file.path + ": the handler does not recognise it");
+            return {FileResult::NamedNotRecognised, 0};
+        }
         const fs::path output = fs::path(options_.outputDirectory) / (name + options_.extension);
         std::error_code error;
         fs::create_directories(output.parent_path(), error);

@@ -15,6 +15,10 @@ Summary Summarise(const std::vector<FileOutcome>& outcomes)
             s.withFailedRows += outcome.failedRows > 0;
             s.failedRows += outcome.failedRows;
             break;
+        case FileResult::NamedNotRecognised:
+            ++s.namedNotRecognised;
+            ++s.notRecognised;
+            break;
         case FileResult::NotRecognised:
             ++s.notRecognised;
             break;
@@ -43,7 +47,7 @@ std::string SummaryLine(const Summary& s)
 
 int SummaryExitCode(const Summary& s, size_t problems)
 {
-    if (s.notOpened + s.vanished + s.failed + problems > 0)
+    if (s.notOpened + s.namedNotRecognised + s.vanished + s.failed + problems > 0)
         return kExitRefused;
     return s.failedRows > 0 ? kExitRowsFailed : kExitOk;
 }

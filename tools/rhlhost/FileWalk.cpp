@@ -44,7 +44,7 @@ std::vector<InputFile> CollectInputs(const std::vector<std::string>& inputs, std
         if (fs::is_directory(input, error))
             WalkDirectory(input, files, problems);
         else
-            files.push_back({input, fs::path(input).filename().string()});
+            files.push_back({input, fs::path(input).filename().string(), true});
     }
     return files;
 }

@@ -10,6 +10,7 @@ namespace host {
 struct InputFile {
     std::string path;
     std::string name; // relative to the directory it was found in; a named file's own name
+    bool named = false; // named on the command line, not found in a directory
 };
 
 // Directories are walked recursively and their files sorted; a named path that
