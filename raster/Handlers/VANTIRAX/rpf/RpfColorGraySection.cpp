@@ -46,21 +46,16 @@ bool RpfColorGraySection::ReadColorGraySection(CFileReader& reader, uint32_t sub
 
 bool RpfColorGraySection::ReadOffsetRecords(CFileReader& reader, uint32_t colormapLocation, bool bigEndian)
 {
-    std::vector<uint8_t> records;
-    if (!ReadRecords(reader, uint64_t(colormapLocation) + colormapOffsetTableOffset, colorGrayOffsetRecordCount,
-                     kColorOffsetRecordBytes, records))
-        return false;
-    RpfFields fields(records.data(), bigEndian);
-    offsetRecords.resize(colorGrayOffsetRecordCount);
-    for (RpfColorOffsetRecord& record : offsetRecords) {
-        fields.Number(record.tableId);
-        fields.Number(record.recordCount);
-        fields.Number(record.elementLength);
-        fields.Number(record.histogramRecordLength);
-        fields.Number(record.tableOffset);
-        fields.Number(record.histogramTableOffset);
-    }
-    return true;
+    return ReadRecordTable(reader, uint64_t(colormapLocation) + colormapOffsetTableOffset, colorGrayOffsetRecordCount,
+                           kColorOffsetRecordBytes, bigEndian, offsetRecords,
+                           [](RpfFields& fields, RpfColorOffsetRecord& record) {
+                               fields.Number(record.tableId);
+                               fields.Number(record.recordCount);
+                               fields.Number(record.elementLength);
+                               fields.Number(record.histogramRecordLength);
+                               fields.Number(record.tableOffset);
+                               fields.Number(record.histogramTableOffset);
+                           });
 }
 
 const RpfValueTable* RpfColorGraySection::FindPaletteTable() const

@@ -42,20 +42,17 @@ bool RpfCompressionSection::ReadLookupSubsection(CFileReader& reader, bool bigEn
     RpfFields fields(header, bigEndian);
     fields.Number(lookupOffsetTableOffset);
     fields.Number(lookupOffsetRecordLength);
-    std::vector<uint8_t> records;
-    if (lookupOffsetRecordLength != kLookupOffsetRecordBytes ||
-        !ReadRecords(reader, uint64_t(lookupSubsectionLocation) + lookupOffsetTableOffset, lookupOffsetRecordCount,
-                     kLookupOffsetRecordBytes, records))
-        return false;
-    RpfFields recordFields(records.data(), bigEndian);
-    lookupOffsetRecords.resize(lookupOffsetRecordCount);
-    for (RpfLookupOffsetRecord& record : lookupOffsetRecords) {
+    const auto readRecord = [](RpfFields& recordFields, RpfLookupOffsetRecord& record) {
         recordFields.Number(record.tableId);
         recordFields.Number(record.recordCount);
         recordFields.Number(record.valuesPerRecord);
         recordFields.Number(record.valueBitLength);
         recordFields.Number(record.tableOffset);
-    }
+    };
+    if (lookupOffsetRecordLength != kLookupOffsetRecordBytes ||
+        !ReadRecordTable(reader, uint64_t(lookupSubsectionLocation) + lookupOffsetTableOffset,
+                         lookupOffsetRecordCount, kLookupOffsetRecordBytes, bigEndian, lookupOffsetRecords, readRecord))
+        return false;
     auto placeOf = [this](const RpfLookupOffsetRecord& record) {
         return RpfTablePlace{record.recordCount, record.valuesPerRecord, record.valueBitLength,
                              uint64_t(lookupSubsectionLocation) + record.tableOffset};

@@ -43,15 +43,23 @@ private:
     bool bigEndian;
 };
 
-// Reads count records of recordBytes bytes each at location into records;
-// false, with nothing allocated, when they do not all lie in the file.
-inline bool ReadRecords(CFileReader& reader, uint64_t location, uint32_t count, uint32_t recordBytes,
-                        std::vector<uint8_t>& records)
+// Reads count records of recordBytes bytes each at location and parses each
+// into its entry of records with readFields(fields, record), in the frame's
+// byte order. False, with nothing allocated, when they do not all lie in the file.
+template <typename Record, typename ReadFields>
+bool ReadRecordTable(CFileReader& reader, uint64_t location, uint32_t count, uint32_t recordBytes, bool bigEndian,
+                     std::vector<Record>& records, ReadFields readFields)
 {
     const uint64_t fileSize = reader.FileSize();
     const uint64_t bytes = uint64_t(count) * recordBytes;
     if (!Readable(location, bytes, fileSize))
         return false;
-    records.resize(bytes);
-    return CheckedRead(reader, fileSize, location, records.data(), bytes);
+    std::vector<uint8_t> stored(bytes);
+    if (!CheckedRead(reader, fileSize, location, stored.data(), bytes))
+        return false;
+    RpfFields fields(stored.data(), bigEndian);
+    records.resize(count);
+    for (Record& record : records)
+        readFields(fields, record);
+    return true;
 }

@@ -18,18 +18,13 @@ bool RpfLocationSection::ReadLocationSection(CFileReader& reader, uint32_t locat
     fields.Number(componentLocationRecordCount);
     fields.Number(componentLocationRecordLength);
     fields.Number(componentAggregateLength);
-    std::vector<uint8_t> records;
-    if (!ReadRecords(reader, uint64_t(location) + kLocationHeaderBytes, componentLocationRecordCount,
-                     kLocationRecordBytes, records))
-        return false;
-    RpfFields recordFields(records.data(), bigEndian);
-    components.resize(componentLocationRecordCount);
-    for (RpfComponentLocation& record : components) {
-        recordFields.Number(record.componentId);
-        recordFields.Number(record.componentLength);
-        recordFields.Number(record.componentLocation);
-    }
-    return true;
+    return ReadRecordTable(reader, uint64_t(location) + kLocationHeaderBytes, componentLocationRecordCount,
+                           kLocationRecordBytes, bigEndian, components,
+                           [](RpfFields& recordFields, RpfComponentLocation& record) {
+                               recordFields.Number(record.componentId);
+                               recordFields.Number(record.componentLength);
+                               recordFields.Number(record.componentLocation);
+                           });
 }
 
 uint32_t RpfLocationSection::FindComponentLocation(uint16_t componentId) const
