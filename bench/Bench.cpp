@@ -14,6 +14,7 @@
 #include <fcntl.h>
 #include <iostream>
 #include <map>
+#include <memory>
 #include <regex>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -26,6 +27,9 @@ constexpr int kDefaultRepetitions = 5;
 constexpr double kMinTimeSeconds = 0.2;
 constexpr int kLargeJpegSize = 16384;      // the image whose open the memory figure measures
 constexpr int kLargeJpegBlockSize = 1024;
+constexpr int32_t kLargeDrawRows = 2048;
+constexpr int kLargeRepetitions = 3;
+constexpr size_t kLargeDistinctStreams = 8;   // as BenchFiles writes them
 
 struct Window {
     int32_t x0, y0, x1, y1;
@@ -287,6 +291,172 @@ void PrintTables(const std::vector<BenchCase>& cases)
               << "%.\n";
 }
 
+// Real-sized images: the open alone, then draws that touch a small part of
+// them, each beside GDAL and, where one exists, the limit.
+struct LargeStep {
+    std::string label;
+    Window window;
+};
+
+std::vector<LargeStep> LargeSteps(const LargeCase& item, int32_t width, int32_t height)
+{
+    const int32_t x0 = width - kWindowSize - kWindowSkew, y0 = height - kWindowSize - kWindowSkew;
+    std::vector<LargeStep> steps{{"open", {0, 0, 0, 0}}, {"window near the end", {x0, y0, x0 + kWindowSize,
+                                                                                     y0 + kWindowSize}}};
+    if (item.jpeg)
+        steps.push_back({"2048 full-width rows", {0, 0, width, kLargeDrawRows}});
+    else
+        steps.push_back({"last row", {0, height - 1, width, height}});
+    return steps;
+}
+
+bool OpenOurs(const HandlerExports& rh, const std::string& path)
+{
+    RHHandle handle {};
+    const bool opened = rh.open(&handle, path.c_str()) == 1;
+    rh.close(&handle);
+    return opened;
+}
+
+bool OpenGdal(const std::string& path)
+{
+    GDALDatasetH dataset = GDALOpen(path.c_str(), GA_ReadOnly);
+    if (dataset != nullptr)
+        GDALClose(dataset);
+    return dataset != nullptr;
+}
+
+// The limit of an uncompressed MONO window: pread of each of its rows' bytes
+// in each block it crosses (IMODE B, one band, 8-bit samples).
+bool PreadWindow(int descriptor, uint64_t dataOffset, int blockSide, int32_t width, const Window& window,
+                 std::vector<uint8_t>& bytes)
+{
+    const uint64_t blocksPerRow = (uint64_t(width) + blockSide - 1) / blockSide, side = uint64_t(blockSide);
+    bytes.resize(size_t(window.Width()));
+    for (int32_t row = window.y0; row < window.y1; ++row)
+        for (int32_t x = window.x0; x < window.x1;) {
+            const uint64_t block = uint64_t(row) / side * blocksPerRow + uint64_t(x) / side;
+            const int32_t count = std::min<int32_t>(window.x1 - x, blockSide - x % blockSide);
+            const uint64_t at = dataOffset + (block * side + uint64_t(row) % side) * side + uint64_t(x) % side;
+            if (::pread(descriptor, bytes.data() + (x - window.x0), size_t(count), off_t(at)) != count)
+                return false;
+            x += count;
+        }
+    return true;
+}
+
+// The streams of a JPEG window's blocks, held in memory: its limit is their
+// decoding alone. The image's blocks repeat its first kLargeDistinctStreams
+// streams in turn, so a block's stream is found among those.
+std::vector<uint8_t> WindowStreams(const LargeCase& item, int32_t width, const Window& window,
+                                   std::vector<JpegStream>& streams)
+{
+    std::vector<uint8_t> file, held;
+    if (!ReadWholeFile(item.path, file))
+        return held;
+    const std::vector<JpegStream> found = FindJpegStreams(file, kLargeDistinctStreams);
+    const int32_t side = item.blockSide, perRow = width / side;
+    for (int32_t by = window.y0 / side; by <= (window.y1 - 1) / side && !found.empty(); ++by)
+        for (int32_t bx = window.x0 / side; bx <= (window.x1 - 1) / side; ++bx) {
+            const JpegStream& stream = found[size_t(by * perRow + bx) % found.size()];
+            streams.push_back({held.size(), stream.length});
+            held.insert(held.end(), file.begin() + long(stream.offset),
+                        file.begin() + long(stream.offset + stream.length));
+        }
+    return held;
+}
+
+void RegisterLimit(const LargeCase& item, const std::string& name, int32_t width, const Window& window)
+{
+    if (item.jpeg) {
+        auto streams = std::make_shared<std::vector<JpegStream>>();
+        auto held = std::make_shared<std::vector<uint8_t>>(WindowStreams(item, width, window, *streams));
+        results.limitKind[name] = "libjpeg-turbo (" + std::to_string(streams->size()) + " streams in memory)";
+        Configure(benchmark::RegisterBenchmark(("limit/" + name).c_str(),
+                                               [held, streams](benchmark::State& state) {
+                                                   std::vector<uint8_t> pixels;
+                                                   for (auto _ : state)
+                                                       if (!DecodeJpegStreams(*held, *streams, pixels))
+                                                           state.SkipWithError("decode failed");
+                                               }),
+                  1);
+        return;
+    }
+    struct stat info {};
+    const uint64_t dataBytes = uint64_t((width + item.blockSide - 1) / item.blockSide) *
+                               uint64_t((width + item.blockSide - 1) / item.blockSide) * item.blockSide *
+                               item.blockSide;
+    if (::stat(item.path.c_str(), &info) != 0 || uint64_t(info.st_size) < dataBytes)
+        return;
+    const uint64_t dataOffset = uint64_t(info.st_size) - dataBytes;
+    results.limitKind[name] = "pread of the rows' bytes";
+    Configure(benchmark::RegisterBenchmark(("limit/" + name).c_str(),
+                                           [item, dataOffset, width, window](benchmark::State& state) {
+                                               const int descriptor = ::open(item.path.c_str(), O_RDONLY);
+                                               std::vector<uint8_t> bytes;
+                                               for (auto _ : state)
+                                                   if (!PreadWindow(descriptor, dataOffset, item.blockSide, width,
+                                                                    window, bytes))
+                                                       state.SkipWithError("read failed");
+                                               ::close(descriptor);
+                                           }),
+              1);
+}
+
+std::vector<std::string> largeNames; // "case: step", in order
+
+void RegisterLargeCase(const HandlerExports& rh, const LargeCase& item)
+{
+    RHHandle handle {};
+    const bool opened = rh.open(&handle, item.path.c_str()) == 1;
+    const int32_t width = int32_t(handle.width), height = int32_t(handle.height);
+    rh.close(&handle);
+    if (!opened) {
+        std::cerr << item.name << ": our open failed, case skipped\n";
+        return;
+    }
+    for (const LargeStep& step : LargeSteps(item, width, height)) {
+        const std::string name = item.name + ": " + step.label;
+        const Window window = step.window;
+        const bool openOnly = step.label == "open";
+        largeNames.push_back(name);
+        Configure(benchmark::RegisterBenchmark(("ours/" + name).c_str(),
+                                               [&rh, item, window, openOnly](benchmark::State& state) {
+                                                   for (auto _ : state)
+                                                       if (!(openOnly ? OpenOurs(rh, item.path)
+                                                                      : DrawOurs(rh, item.path, window, nullptr)))
+                                                           state.SkipWithError("failed");
+                                               }),
+                  kLargeRepetitions);
+        Configure(benchmark::RegisterBenchmark(("gdal/" + name).c_str(),
+                                               [item, window, openOnly](benchmark::State& state) {
+                                                   std::vector<uint8_t> pixels;
+                                                   int sampleBytes = 0;
+                                                   for (auto _ : state)
+                                                       if (!(openOnly ? OpenGdal(item.path)
+                                                                      : ReadGdal(item.path, window, pixels,
+                                                                                 sampleBytes)))
+                                                           state.SkipWithError("GDAL failed");
+                                               }),
+                  kLargeRepetitions);
+        if (!openOnly)
+            RegisterLimit(item, name, width, window);
+    }
+}
+
+void PrintLargeTable()
+{
+    if (largeNames.empty())
+        return;
+    std::cout << "\n### Real-sized images (median ms; GDAL / ours above 1 means we are faster; ours / limit, 1 is "
+                 "the floor)\n\n| case: step | ours | GDAL | GDAL / ours | limit | ours / limit | limit is |\n"
+              << "|---|---:|---:|---:|---:|---:|---|\n";
+    for (const std::string& n : largeNames)
+        std::cout << "| " << n << " | " << Milliseconds("ours/" + n) << " | " << Milliseconds("gdal/" + n) << " | "
+                  << Ratio("gdal/" + n, "ours/" + n) << " | " << Milliseconds("limit/" + n) << " | "
+                  << Ratio("ours/" + n, "limit/" + n) << " | " << results.limitKind[n] << " |\n";
+}
+
 // Whether the benchmark filter selects any benchmark of the case, so that a
 // filtered run surveys only the cases it times.
 bool Selected(const std::string& name)
@@ -295,7 +465,7 @@ bool Selected(const std::string& name)
     if (filter.empty() || filter == "all" || filter[0] == '-')
         return true;
     const std::regex pattern(filter);
-    for (const char* prefix : {"ours_full/", "gdal_full/", "ours_window/", "gdal_window/", "limit/"})
+    for (const char* prefix : {"ours_full/", "gdal_full/", "ours_window/", "gdal_window/", "limit/", "ours/", "gdal/"})
         if (std::regex_search(prefix + name + "/", pattern))
             return true;
     return false;
@@ -328,11 +498,15 @@ int main(int argc, char** argv)
         if (Selected(item.name) && Survey(rh, item, geometry))
             RegisterCase(rh, item, geometry, Repetitions());
     }
+    for (const LargeCase& item : PrepareLargeCases(argv[1]))
+        if (Selected(item.name))
+            RegisterLargeCase(rh, item);
     TableReporter reporter;
     reporter.SetOutputStream(&std::cerr);
     reporter.SetErrorStream(&std::cerr);
     benchmark::RunSpecifiedBenchmarks(&reporter);
     PrintTables(cases);
+    PrintLargeTable();
     benchmark::Shutdown();
     return 0;
 }

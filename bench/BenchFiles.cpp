@@ -1,5 +1,6 @@
 #include "bench/BenchFiles.h"
 
+#include "tests/fixtures/JpegBlockWriter.h"
 #include "tests/fixtures/NitfImageWriter.h"
 
 #include <gdal.h>
@@ -7,6 +8,7 @@
 
 #include <cstdint>
 #include <cstdio>
+#include <fcntl.h>
 #include <fstream>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -182,7 +184,86 @@ void AddCorpusFrame(const std::string& corpus, const char* name, const char* fil
         cases.push_back({name, path, false});
 }
 
+constexpr int32_t kSparseSide = 73000;
+constexpr int32_t kSparseBlockSide = 8192;
+constexpr size_t kFlOffset = 342, kLiOffset = 369; // FL (12 digits) and LI (10) of a NITF 2.1 file
+constexpr int kDistinctStreams = 8;
+
+// The file of this image with FL and LI declaring dataBytes of image data.
+std::string HeaderDeclaring(const NitfImagePlan& plan, uint64_t dataBytes, const std::string& data)
+{
+    std::string file = BuildImageFile(plan, data);
+    const size_t header = file.size() - data.size();
+    file.replace(kFlOffset, 12, Digits(header + dataBytes, 12));
+    file.replace(kLiOffset, 10, Digits(dataBytes, 10));
+    return file;
+}
+
+// 9 x 9 blocks of 8192 x 8192 bytes, holes on disk.
+bool WriteSparseMono(const std::string& path)
+{
+    NitfImagePlan plan;
+    plan.rows = plan.columns = kSparseSide;
+    plan.NPPBH = plan.NPPBV = kSparseBlockSide;
+    plan.NBPR = plan.NBPC = (kSparseSide + kSparseBlockSide - 1) / kSparseBlockSide;
+    const uint64_t dataBytes = uint64_t(plan.NBPR) * plan.NBPC * kSparseBlockSide * kSparseBlockSide;
+    const std::string header = HeaderDeclaring(plan, dataBytes, "");
+    const int file = ::open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
+    const bool written = file >= 0 && ::pwrite(file, header.data(), header.size(), 0) == ssize_t(header.size()) &&
+                         ::ftruncate(file, off_t(header.size() + dataBytes)) == 0;
+    return (file < 0 || ::close(file) == 0) && written;
+}
+
+// Grey blocks of a smooth picture with some texture, kDistinctStreams of
+// them repeated over the image: a file of moderate size that decodes as a
+// real image of its size would.
+bool WriteRepeatedJpeg(const std::string& path, int side, int blockSide)
+{
+    const int perRow = side / blockSide;
+    JpegBlockPlan block;
+    block.width = block.height = uint32_t(blockSide);
+    std::vector<Bytes> streams;
+    for (int k = 0; k < kDistinctStreams; ++k) {
+        Bytes pixels(size_t(blockSide) * blockSide);
+        for (int y = 0; y < blockSide; ++y)
+            for (int x = 0; x < blockSide; ++x)
+                pixels[size_t(y) * blockSide + x] = uint8_t((x + y) / 8 + k * 16 + (Noise(x, y + k) & 0x07));
+        streams.push_back(EncodeJpegBlock(pixels, block));
+    }
+    std::vector<Bytes> blocks;
+    for (int i = 0; i < perRow * perRow; ++i)
+        blocks.push_back(streams[size_t(i % kDistinctStreams)]);
+    NitfApp6Plan app6;
+    app6.blocksPerRow = app6.blocksPerColumn = uint16_t(perRow);
+    const Bytes data = BuildNitfJpegData(blocks, app6);
+    NitfImagePlan plan;
+    plan.rows = plan.columns = side;
+    plan.NPPBH = plan.NPPBV = blockSide;
+    plan.NBPR = plan.NBPC = perRow;
+    plan.IC = "C3";
+    plan.COMRAT = "00.0";
+    std::ofstream out(path, std::ios::binary);
+    out << HeaderDeclaring(plan, data.size(), std::string(data.begin(), data.end()));
+    return static_cast<bool>(out);
+}
+
 } // namespace
+
+std::vector<LargeCase> PrepareLargeCases(const std::string& dataDir)
+{
+    ::mkdir(dataDir.c_str(), 0755);
+    std::vector<LargeCase> cases;
+    const std::string sparse = dataDir + "/nc-mono8-5gib.ntf";
+    if (Exists(sparse) || WriteSparseMono(sparse))
+        cases.push_back({"nc-mono8-5gib", sparse, false, kSparseBlockSide});
+    for (const auto& [side, blockSide] : {std::pair{32768, 512}, std::pair{65536, 1024}}) {
+        const std::string name = "jpeg-" + std::to_string(side) + "-blocks" + std::to_string(blockSide);
+        const std::string path = dataDir + "/" + name + ".ntf";
+        if (Exists(path) || WriteRepeatedJpeg(path, side, blockSide))
+            cases.push_back({name, path, true, blockSide});
+    }
+    return cases;
+}
 
 bool WriteJpegImage(const std::string& path, int size, int blockSize)
 {

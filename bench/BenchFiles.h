@@ -17,6 +17,17 @@ struct BenchCase {
 // file is present.
 std::vector<BenchCase> PrepareCases(const std::string& dataDir, const std::string& corpusDir);
 
+// Real-sized images, written once: a sparse uncompressed MONO image of about
+// 5 GiB (73,000 x 73,000) and JPEG images of 32768 x 32768 in 512 x 512 blocks
+// and 65536 x 65536 in 1024 x 1024 blocks, whose blocks repeat a few streams.
+struct LargeCase {
+    std::string name;
+    std::string path;
+    bool jpeg = false;
+    int blockSide = 0;
+};
+std::vector<LargeCase> PrepareLargeCases(const std::string& dataDir);
+
 // Writes a size x size JPEG NITF cut into blocks of blockSize (used for the
 // memory measurement of a large image).
 bool WriteJpegImage(const std::string& path, int size, int blockSize);

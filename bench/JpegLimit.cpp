@@ -54,12 +54,12 @@ bool StartsStream(const std::vector<uint8_t>& file, size_t at)
 
 } // namespace
 
-std::vector<JpegStream> FindJpegStreams(const std::vector<uint8_t>& file)
+std::vector<JpegStream> FindJpegStreams(const std::vector<uint8_t>& file, size_t maxStreams)
 {
     std::vector<JpegStream> streams;
     std::vector<uint8_t> pixels;
     size_t at = 0;
-    while (at < file.size()) {
+    while (at < file.size() && streams.size() < maxStreams) {
         if (!StartsStream(file, at)) {
             ++at;
             continue;

@@ -3,6 +3,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <limits>
 #include <vector>
 
 struct JpegStream {
@@ -10,8 +11,9 @@ struct JpegStream {
     size_t length = 0;
 };
 
-// Finds the JPEG streams stored one after another in a file's bytes.
-std::vector<JpegStream> FindJpegStreams(const std::vector<uint8_t>& file);
+// Finds the JPEG streams stored one after another in a file's bytes (the
+// first maxStreams of them).
+std::vector<JpegStream> FindJpegStreams(const std::vector<uint8_t>& file, size_t maxStreams = SIZE_MAX);
 // Decodes every stream into pixels (reused from stream to stream); false
 // when one does not decode.
 bool DecodeJpegStreams(const std::vector<uint8_t>& file, const std::vector<JpegStream>& streams,
