@@ -7,11 +7,12 @@ namespace host {
 namespace {
 
 constexpr unsigned kMaxJobs = 256;
+constexpr unsigned kMaxProduct = 65535; // boundary rectangles are counted in two bytes
 
-bool ParseJobs(const std::string& text, unsigned& jobs)
+bool ParseCount(const std::string& text, unsigned& count, unsigned most)
 {
     char tail = '\0';
-    return std::sscanf(text.c_str(), "%u%c", &jobs, &tail) == 1 && jobs >= 1 && jobs <= kMaxJobs;
+    return std::sscanf(text.c_str(), "%u%c", &count, &tail) == 1 && count >= 1 && count <= most;
 }
 
 // Applies the option at args[i] and its value; false with a message.
@@ -29,10 +30,12 @@ bool ApplyOption(const std::vector<std::string>& args, size_t& i, CommandLine& l
     const std::string& value = args[++i];
     if (name == "--window" && ParseWindow(value.c_str(), line.window))
         return true;
-    if (name == "--jobs" && ParseJobs(value, line.jobs))
+    if (name == "--jobs" && ParseCount(value, line.jobs, kMaxJobs))
         return true;
-    if (name == "-o") {
-        line.output = value;
+    if (name == "--product" && ParseCount(value, line.product, kMaxProduct))
+        return true;
+    if (name == "-o" || name == "--toc") {
+        (name == "-o" ? line.output : line.toc) = value;
         return true;
     }
     if (name == "--format" && (value == "tif" || value == "png")) {
@@ -40,13 +43,13 @@ bool ApplyOption(const std::vector<std::string>& args, size_t& i, CommandLine& l
         return true;
     }
     message = "bad option " + name + " " + value +
-              " (--window X0,Y0,X1,Y1 with X1 > X0 and Y1 > Y0; --jobs 1 to 256; --format tif or png)";
+              " (--window X0,Y0,X1,Y1 with X1 > X0 and Y1 > Y0; --jobs 1 to 256; --format tif or png; --product 1 to 65535)";
     return false;
 }
 
 // Which options each command takes; render takes --jobs and --format only
-// with -o, as a batch.
-bool Applies(const std::string& command, const std::string& option, bool batch)
+// with -o, as a batch; mosaic takes --product only with --toc.
+bool Applies(const std::string& command, const std::string& option, bool batch, bool toc)
 {
     if (command == "info")
         return option == "--text";
@@ -55,7 +58,7 @@ bool Applies(const std::string& command, const std::string& option, bool batch)
     if (command == "render")
         return option == "--window" || option == "-o" || (batch && (option == "--jobs" || option == "--format"));
     if (command == "mosaic")
-        return option == "-o";
+        return option == "-o" || option == "--toc" || (toc && option == "--product");
     return false;
 }
 
@@ -88,8 +91,9 @@ bool ParseCommandLine(const std::string& command, const std::vector<std::string>
         }
     }
     for (const std::string& option : given)
-        if (!Applies(command, option, given.count("-o") != 0)) {
-            message = option + " does not apply to " + command + (command == "render" ? " without -o" : "");
+        if (!Applies(command, option, given.count("-o") != 0, given.count("--toc") != 0)) {
+            message = option + " does not apply to " + command +
+                      (command == "render" ? " without -o" : command == "mosaic" ? " without --toc" : "");
             return false;
         }
     return true;

@@ -15,6 +15,8 @@ struct CommandLine {
     unsigned jobs = 1;           // --jobs N
     std::string format = "tif";  // --format tif|png
     bool text = false;           // --text
+    std::string toc;             // --toc A.TOC: the mosaic's table of contents
+    unsigned product = 0;        // --product N: its boundary rectangle, from 1
 };
 
 // The options of command, each "--name value" or "--name=value". False with

@@ -28,13 +28,13 @@ void WalkDirectory(const fs::path& root, std::vector<InputFile>& files, std::vec
               [](const InputFile& a, const InputFile& b) { return a.path < b.path; });
 }
 
+} // namespace
+
 std::string Folded(std::string name)
 {
     std::transform(name.begin(), name.end(), name.begin(), [](unsigned char c) { return std::tolower(c); });
     return name;
 }
-
-} // namespace
 
 std::vector<InputFile> CollectInputs(const std::vector<std::string>& inputs, std::vector<std::string>& problems)
 {

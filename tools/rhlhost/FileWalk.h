@@ -24,4 +24,7 @@ std::vector<InputFile> CollectInputs(const std::vector<std::string>& inputs, std
 // ignore case.
 std::vector<std::string> UniqueNames(const std::vector<InputFile>& files);
 
+// The name in lower case, for comparing names that may differ only in case.
+std::string Folded(std::string name);
+
 } // namespace host

@@ -16,6 +16,8 @@ namespace {
 // The palette every frame shares, or empty when they differ or have none.
 std::vector<uint8_t> SharedPalette(const std::vector<MosaicFrame>& frames)
 {
+    if (frames.empty())
+        return {};
     for (const MosaicFrame& frame : frames)
         if (frame.palette.empty() || frame.palette != frames.front().palette)
             return {};
@@ -82,10 +84,10 @@ void Place(const MosaicFrame& frame, const Pixels& pixels, const MosaicGrid& gri
 }
 
 // Draws every frame onto the canvas; the number of rows that failed to decode.
-uint32_t Paint(const Exports& rh, const MosaicFrames& collected, const MosaicGrid& grid, Raster& canvas)
+uint32_t Paint(const Exports& rh, const std::vector<MosaicFrame>& frames, const MosaicGrid& grid, Raster& canvas)
 {
     uint32_t failedRows = 0;
-    for (const MosaicFrame& frame : collected.frames) {
+    for (const MosaicFrame& frame : frames) {
         OpenFile file(rh, frame.path);
         Pixels pixels;
         std::string message;
@@ -115,6 +117,14 @@ bool WriteMosaic(const std::string& output, const Raster& canvas, const MosaicGr
 
 } // namespace
 
+bool PaintAndWrite(const Exports& rh, const std::vector<MosaicFrame>& frames, const MosaicGrid& grid,
+                   const std::string& output, uint32_t& failedRows, std::string& message)
+{
+    Raster canvas = EmptyCanvas(frames, grid);
+    failedRows = Paint(rh, frames, grid, canvas);
+    return WriteMosaic(output, canvas, grid, message);
+}
+
 int RunMosaic(const Exports& rh, const std::vector<std::string>& inputs, const std::string& output)
 {
     std::vector<std::string> problems;
@@ -130,9 +140,8 @@ int RunMosaic(const Exports& rh, const std::vector<std::string>& inputs, const s
         return Fail(kExitRefused, "no frame to place in the mosaic");
     if (!planned)
         return Fail(kExitRefused, message);
-    Raster canvas = EmptyCanvas(collected.frames, grid);
-    const uint32_t failedRows = Paint(rh, collected, grid, canvas);
-    if (!WriteMosaic(output, canvas, grid, message))
+    uint32_t failedRows = 0;
+    if (!PaintAndWrite(rh, collected.frames, grid, output, failedRows, message))
         return Fail(kExitRefused, message);
     std::fprintf(stderr, "rhlhost: %s: %zu frames on %u x %u pixels, %zu refused, %zu not recognised\n",
                  output.c_str(), collected.frames.size(), grid.width, grid.height, collected.refusals.size(),

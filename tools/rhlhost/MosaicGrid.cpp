@@ -5,14 +5,13 @@
 
 #include <algorithm>
 #include <cmath>
+#include <filesystem>
 
 namespace host {
 namespace {
 
 // Frames of one product share their pixel size to far better than this.
 constexpr double kScaleTolerance = 1e-6;
-constexpr double kMaxMosaicPixels = double(1u << 28);
-constexpr double kTurnDegrees = 360.0;
 
 bool Refuse(MosaicFrames& collected, const std::string& path, const std::string& reason)
 {
@@ -93,7 +92,10 @@ MosaicFrames CollectFrames(const Exports& rh, const std::vector<InputFile>& file
 {
     MosaicFrames collected;
     for (const InputFile& file : files) {
-        if (rh.isFormat(file.path.c_str()) != 1)
+        std::error_code error;
+        if (file.named && !std::filesystem::exists(file.path, error))
+            Refuse(collected, file.path, "no such file");
+        else if (rh.isFormat(file.path.c_str()) != 1)
             ++collected.notRecognised;
         else
             AddFrame(rh, file, collected);

@@ -12,6 +12,9 @@ namespace host {
 
 // Every frame of a mosaic is in WGS 84 longitude and latitude.
 constexpr uint32_t kMosaicEpsg = 4326;
+// The largest mosaic, in pixels.
+constexpr double kMaxMosaicPixels = double(1u << 28);
+constexpr double kTurnDegrees = 360.0;
 
 struct MosaicFrame {
     std::string path;

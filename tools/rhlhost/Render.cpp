@@ -84,6 +84,8 @@ bool FormatFromName(const std::string& output, OutputFormat& format)
         format = OutputFormat::GeoTiff;
     else if (EndsWith(output, ".png"))
         format = OutputFormat::Png;
+    else if (EndsWith(output, ".raw"))
+        format = OutputFormat::Raw;
     else
         return false;
     return true;

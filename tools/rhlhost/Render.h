@@ -10,7 +10,7 @@ namespace host {
 
 enum class OutputFormat { GeoTiff, Png, Raw };
 
-// ".tif" / ".tiff": GeoTIFF, ".png": PNG (any case); false for other names.
+// ".tif" / ".tiff": GeoTIFF, ".png": PNG, ".raw": the rows (any case); false for other names.
 bool FormatFromName(const std::string& output, OutputFormat& format);
 
 enum class RenderStatus {

@@ -8,6 +8,9 @@
 //   rhlhost [--handler PATH] render FILE OUT.tif|OUT.png [--window X0,Y0,X1,Y1]
 //   rhlhost [--handler PATH] render [--jobs N] [--format tif|png] [--window X0,Y0,X1,Y1] -o OUTDIR FILE_OR_DIR...
 //   rhlhost [--handler PATH] mosaic -o OUT.tif FILE_OR_DIR...
+//   rhlhost [--handler PATH] mosaic -o OUT.tif --toc A.TOC --product N
+//   rhlhost toc A.TOC
+//   rhlhost [--handler PATH] --version
 #include "Batch.h"
 #include "CommandLine.h"
 #include "Drawing.h"
@@ -17,6 +20,7 @@
 #include "Mosaic.h"
 #include "PlatformFiles.h"
 #include "Render.h"
+#include "TableOfContents.h"
 
 #include <cstdio>
 #include <cstring>
@@ -36,7 +40,10 @@ constexpr const char* kUsage =
     "  dump FILE OUT.raw [--window X0,Y0,X1,Y1]\n"
     "  render FILE OUT.tif|OUT.png [--window X0,Y0,X1,Y1]\n"
     "  render [--jobs N] [--format tif|png] [--window X0,Y0,X1,Y1] -o OUTDIR FILE_OR_DIR...\n"
-    "  mosaic -o OUT.tif FILE_OR_DIR...";
+    "  mosaic -o OUT.tif FILE_OR_DIR...\n"
+    "  mosaic -o OUT.tif --toc A.TOC --product N\n"
+    "  toc A.TOC\n"
+    "  --version | --help";
 
 // The handler beside this executable's own file, wherever it was started
 // from: never one that happens to lie in the working directory.
@@ -58,24 +65,66 @@ std::string JsonString(const char* text)
     return quoted + "\"";
 }
 
+struct Identity {
+    uint16_t version = 0;
+    std::string name, description;
+    std::vector<std::string> extensions;
+};
+
+Identity ReadIdentity(const Exports& rh)
+{
+    alignas(8) char record[kIdentitySize] = {};
+    rh.identify(record);
+    Identity identity;
+    uint16_t extensionCount;
+    std::memcpy(&identity.version, record, 2);
+    std::memcpy(&extensionCount, record + 1026, 2);
+    for (uint16_t i = 0; i < extensionCount && i < 100; ++i)
+        identity.extensions.push_back(std::string(record + 1028 + 10 * i, strnlen(record + 1028 + 10 * i, 10)));
+    record[2 + 511] = record[514 + 511] = '\0';
+    identity.name = record + 2;
+    identity.description = record + 514;
+    return identity;
+}
+
 int Identify(const Exports& rh)
 {
-    alignas(8) char identity[kIdentitySize] = {};
-    rh.identify(identity);
-    uint16_t version;
-    uint16_t extensionCount;
-    std::memcpy(&version, identity, 2);
-    std::memcpy(&extensionCount, identity + 1026, 2);
+    const Identity identity = ReadIdentity(rh);
     std::string extensions;
-    for (uint16_t i = 0; i < extensionCount && i < 100; ++i) {
-        char slot[11] = {};
-        std::memcpy(slot, identity + 1028 + 10 * i, 10);
-        extensions += (i ? ", " : "") + JsonString(slot);
-    }
-    identity[2 + 511] = identity[514 + 511] = '\0';
-    std::printf("{\"version\": %u, \"name\": %s, \"description\": %s, \"extensions\": [%s]}\n", version,
-                JsonString(identity + 2).c_str(), JsonString(identity + 514).c_str(), extensions.c_str());
+    for (const std::string& extension : identity.extensions)
+        extensions += (extensions.empty() ? "" : ", ") + JsonString(extension.c_str());
+    std::printf("{\"version\": %u, \"name\": %s, \"description\": %s, \"extensions\": [%s]}\n", identity.version,
+                JsonString(identity.name.c_str()).c_str(), JsonString(identity.description.c_str()).c_str(),
+                extensions.c_str());
     return kExitOk;
+}
+
+int Version(const Exports& rh, const std::string& handlerPath)
+{
+    const Identity identity = ReadIdentity(rh);
+    std::printf("rhlhost %s\nhandler %s version %u, %s (%s)\n", VX_VERSION, identity.name.c_str(), identity.version,
+                identity.description.c_str(), handlerPath.c_str());
+    return kExitOk;
+}
+
+int Toc(const std::string& path)
+{
+    TableOfContents toc;
+    std::string message;
+    if (!ReadTableOfContents(path, toc, message))
+        return Fail(kExitRefused, path + ": " + message);
+    PrintTableOfContents(path, toc);
+    return kExitOk;
+}
+
+// A named input that is not there: reported, exit code 1.
+bool Missing(const std::string& path)
+{
+    std::error_code error;
+    if (std::filesystem::exists(path, error))
+        return false;
+    Fail(kExitRefused, path + ": no such file");
+    return true;
 }
 
 // A file that is not there is answered 0 like any other, and is an error.
@@ -124,8 +173,10 @@ int Render(const Exports& rh, const CommandLine& line, bool raw)
     if (line.positional.size() != 2)
         return Fail(kExitUsage, kUsage);
     OutputFormat format = OutputFormat::Raw;
-    if (!raw && !FormatFromName(line.positional[1], format))
-        return Fail(kExitUsage, "render writes .tif, .tiff or .png files");
+    if (!FormatFromName(line.positional[1], format) || (format == OutputFormat::Raw) != raw)
+        return Fail(kExitUsage, raw ? "dump writes .raw files" : "render writes .tif, .tiff or .png files");
+    if (Missing(line.positional[0]))
+        return kExitRefused;
     return RenderOne(rh, line.positional[0], line.positional[1], format, line.window);
 }
 
@@ -137,13 +188,16 @@ int Run(const Exports& rh, const std::string& command, const CommandLine& line)
     if (command == "probe" && !args.empty())
         return Probe(rh, args);
     if (command == "info" && args.size() == 1)
-        return Info(rh, args[0], line.text);
+        return Missing(args[0]) ? kExitRefused : Info(rh, args[0], line.text);
     if (command == "dump" || command == "render")
         return Render(rh, line, command == "dump");
-    if (command == "mosaic" && !args.empty() && !line.output.empty()) {
+    const bool fromToc = !line.toc.empty();
+    if (command == "mosaic" && !line.output.empty() && (fromToc ? args.empty() && line.product > 0 : !args.empty())) {
         OutputFormat format = OutputFormat::Raw;
         if (!FormatFromName(line.output, format) || format != OutputFormat::GeoTiff)
             return Fail(kExitUsage, "mosaic writes .tif or .tiff files");
+        if (fromToc)
+            return Missing(line.toc) ? kExitRefused : RunTocMosaic(rh, line.toc, line.product, line.output);
         return RunMosaic(rh, args, line.output);
     }
     return Fail(kExitUsage, kUsage);
@@ -151,7 +205,7 @@ int Run(const Exports& rh, const std::string& command, const CommandLine& line)
 
 bool IsCommand(const std::string& word)
 {
-    for (const char* command : {"identify", "probe", "info", "dump", "render", "mosaic"})
+    for (const char* command : {"identify", "probe", "info", "dump", "render", "mosaic", "toc", "--version"})
         if (word == command)
             return true;
     return false;
@@ -181,10 +235,15 @@ int main(int argc, char** argv)
     if (!ParseCommandLine(command, std::vector<std::string>(argv + next, argv + argc), line, message))
         return Fail(kExitUsage, message);
 
+    if (command == "toc") // read here, without the handler
+        return line.positional.size() == 1 ? Toc(line.positional[0]) : Fail(kExitUsage, kUsage);
+
     Exports rh{};
     if (handlerPath.empty())
         return Fail(kExitUsage, "cannot tell where this program lies: give --handler PATH");
     if (!LoadHandler(handlerPath, rh, message))
         return Fail(kExitUsage, message);
+    if (command == "--version")
+        return line.positional.empty() ? Version(rh, handlerPath) : Fail(kExitUsage, kUsage);
     return Run(rh, command, line);
 }

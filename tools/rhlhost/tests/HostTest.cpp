@@ -188,6 +188,12 @@ const Command kCommands[] = {
     {{"mosaic", "-o", "OUT/m.png", "IN"}, 2, {"mosaic writes .tif or .tiff files"}, {}},
     {{"render", "-o", "OUT", "IN/notes.txt"}, 1, {"IN/notes.txt: the handler does not recognise it", "1 files: 0 rendered"}, {}},
     {{"mosaic", "-o", "OUT/m.tif", "IN/utm.ntf"}, 1, {"no frame to place in the mosaic"}, {}},
+    {{"--version"}, 0, {"\nhandler VANTIRAX.rhl version 3, CADRG, CIB and NITF Format Handler"}, {}},
+    {{"dump", "IN/frame.ntf", "OUT/frame.tif"}, 2, {"dump writes .raw files"}, {}},
+    {{"info", "IN/missing.ntf"}, 1, {"IN/missing.ntf: no such file"}, {}},
+    {{"toc", "IN/frame.ntf"}, 1, {"IN/frame.ntf: no component 148 in the location section"}, {}},
+    {{"mosaic", "-o", "OUT/m.tif", "--product", "1", "IN"}, 2, {"--product does not apply to mosaic without --toc"}, {}},
+    {{"mosaic", "-o", "OUT/m.tif", "--toc", "IN/A.TOC", "--product", "1"}, 1, {"IN/A.TOC: no such file"}, {}},
     {{"mosaic", "-o", "OUT/m.tif", "IN"}, 1,
      {"IN/utm.ntf: EPSG:32633 (WGS 84 / UTM zone 33N, metres): a mosaic takes EPSG:4326 frames only",
       "IN/rotated.ntf: the frame is not north up", "IN/rows_fail.ntf: the frame has no georeference",
@@ -541,6 +547,52 @@ TEST(HostMosaic, FramesMeetOnOneGridAsTheirDumpsSay)
             continue;
         EXPECT_TRUE(gdal.hasNodata && gdal.nodata == kRpfMaskedPixel);
         EXPECT_EQ(gdal.checksums, std::vector<uint32_t>{Checksum(expected, m.width, m.height)});
+    }
+}
+
+// The corpus tables of contents listed and mosaicked as GDAL reads them:
+// corners, frame counts and the mosaic's grid; the frame, named in another
+// case, placed where its index record says (whatever its own corners) as its
+// dump says, or reported missing and left as nodata.
+TEST(HostToc, ListingAndMosaicGridAreGdals)
+{
+    VX_SKIP_WITHOUT_CORPUS();
+    for (const std::string toc : {"rpf/gdal-handmade/A.TOC", "rpf/gdal-zone9/RPF/A.TOC"}) {
+        const ProcessResult listed = RunHost({"toc", CorpusPath(toc)});
+        const auto corners = NumbersIn(listed.out, "latitude (-?[\\d.]+)  longitude (-?[\\d.]+)");
+        const auto frames = NumbersIn(listed.out, "(\\d+) x (\\d+) \\(rows x columns\\)");
+        const GdalReport gdal = ReadWithGdal(CorpusPath(toc));
+        ASSERT_TRUE(listed.exitCode == 0 && gdal.read && corners.size() == 2 && frames.size() == 1) << listed.out;
+        EXPECT_EQ(gdal.width, frames[0][1] * kRpfFrameSide);
+        EXPECT_EQ(gdal.height, frames[0][0] * kRpfFrameSide);
+        EXPECT_NEAR(gdal.X(0, 0), corners[0][1], 1e-8);
+        EXPECT_NEAR(gdal.Y(0, 0), corners[0][0], 1e-8);
+        if (toc.find("zone9") != std::string::npos)
+            continue; // polar: GDAL's pixels there are metres
+        EXPECT_NEAR(gdal.X(gdal.width, gdal.height), corners[1][1], 1e-8);
+        EXPECT_NEAR(gdal.Y(gdal.width, gdal.height), corners[1][0], 1e-8);
+    }
+    const std::string toc = CorpusPath("rpf/gdal-handmade/A.TOC");
+    const GdalReport expected = ReadWithGdal(toc);
+    for (const bool present : {true, false}) {
+        TempDirectory in, out;
+        fs::copy_file(toc, in / "A.TOC");
+        std::string pixels;
+        if (present) {
+            WriteFile(in / "rpftoc01.on2", SmallFrameFile()); // named RPFTOC01.ON2
+            ASSERT_EQ(RunHost({"dump", in / "rpftoc01.on2", out / "frame.raw"}).exitCode, 0);
+            pixels = ReadWholeFile(out / "frame.raw");
+        }
+        const ProcessResult result = RunHost({"mosaic", "-o", out / "m.tif", "--toc", in / "A.TOC", "--product=1"});
+        EXPECT_EQ(result.exitCode, present ? 0 : 1) << result.err;
+        EXPECT_TRUE(Says(result, present ? "1 frames on 1536 x 1536 pixels, 0 missing" : "RPFTOC01.ON2 is missing"));
+        const GdalReport gdal = ReadWithGdal(out / "m.tif");
+        ASSERT_TRUE(gdal.width == expected.width && gdal.height == expected.height) << result.err;
+        for (size_t i = 0; i < 6; ++i)
+            EXPECT_NEAR(gdal.geoTransform[i], expected.geoTransform[i], 1e-12);
+        if (present) {
+            EXPECT_EQ(gdal.checksums, std::vector<uint32_t>{Checksum(pixels, kRpfFrameSide, kRpfFrameSide)});
+        }
     }
 }
 
