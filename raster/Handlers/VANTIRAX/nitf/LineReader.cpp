@@ -124,10 +124,12 @@ bool CNitfImage::ReadUncompressedBlock(CFileReader& reader, uint32_t block, uint
 void CNitfImage::ScatterHeld(const uint8_t* const held[], uint32_t n, uint8_t* out) const
 {
     if (held[0] != nullptr && held[1] != nullptr && held[2] != nullptr) {
-        for (uint32_t i = 0; i < n; ++i) {
-            out[size_t(i) * kRgbBands] = held[0][i];
-            out[size_t(i) * kRgbBands + 1] = held[1][i];
-            out[size_t(i) * kRgbBands + 2] = held[2][i];
+        // The band pointers in locals: stores to out cannot change them.
+        const uint8_t *red = held[0], *green = held[1], *blue = held[2];
+        for (size_t i = 0; i < n; ++i) {
+            out[i * kRgbBands] = red[i];
+            out[i * kRgbBands + 1] = green[i];
+            out[i * kRgbBands + 2] = blue[i];
         }
         return;
     }
@@ -275,12 +277,21 @@ void CNitfImage::ScatterBand(const uint8_t* source, uint32_t sourceStride, uint3
         return;
     }
     if (source != nullptr && bytesPerPixel == 2) {
-        // 16-bit samples: the shift is worked out once for the span.
+        // 16-bit samples: the shift is worked out once for the span, and the
+        // loop is one the compiler vectorises (size_t indices, no calls).
         const int32_t significant = SignificantBits();
-        for (uint32_t i = 0; i < n; ++i) {
-            const uint8_t* pixel = source + size_t(i) * sourceStride;
-            out[i * outStride + size_t(drawn)] = TopByte(uint64_t(pixel[0]) << kByteBits | pixel[1], significant);
+        const unsigned right = significant >= int32_t(kByteBits) ? unsigned(significant) - kByteBits : 0;
+        const unsigned left = significant >= int32_t(kByteBits) ? 0 : kByteBits - unsigned(significant);
+        const auto reduce = [right, left](const uint8_t* pixel) {
+            return uint8_t(((unsigned(pixel[0]) << kByteBits | pixel[1]) >> right) << left);
+        };
+        if (outStride == 1 && sourceStride == 2) { // one band stored apart: constant strides
+            for (size_t i = 0; i < n; ++i)
+                out[i] = reduce(source + 2 * i);
+            return;
         }
+        for (size_t i = 0; i < n; ++i)
+            out[i * outStride + size_t(drawn)] = reduce(source + i * sourceStride);
         return;
     }
     for (uint32_t i = 0; i < n; ++i)
