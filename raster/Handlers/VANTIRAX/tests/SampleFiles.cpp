@@ -97,10 +97,9 @@ std::string Jpeg2000(bool colour, unsigned seed)
     plan.COMRAT = "N001";
     plan.NBPP = colour ? 8 : 16;
     plan.ABPP = colour ? 8 : 12;
-    std::vector<uint16_t> samples;
-    for (uint32_t i = 0; i < 70 * 90 * plan.bands.size(); ++i)
-        samples.push_back(uint16_t((i / 90 % 70 * 3 + i % 90 * 5 + i / 6300 * 70 + seed * 11) * (colour ? 1 : 29) %
-                                   (colour ? 256 : 4096)));
+    std::vector<uint16_t> samples(70 * 90 * plan.bands.size());
+    for (uint32_t i = 0; i < samples.size(); ++i)
+        samples[i] = uint16_t((i / 90 * 3 + i % 90 * 5 + seed * 11) * (colour ? 1 : 29) % (colour ? 256 : 4096));
     const std::string codestream = EncodeJpeg2000(90, 70, uint32_t(plan.bands.size()), colour ? 8 : 12, 32, samples);
     return BuildImageFile(plan, colour ? Jp2File(codestream) : codestream);
 }
