@@ -1,8 +1,8 @@
 // Writes the seed corpora of the fuzz targets into one folder per target: the
 // sample files of every kind (whole files for the export and header
 // targets), the per-parser inputs cut out of those and of the shared sample
-// files, JPEG streams of every lossless predictor and default table, and
-// MGRS references and image corners.
+// files (JPEG 2000 image data among them), JPEG streams of every lossless
+// predictor and default table, and MGRS references and image corners.
 //   fuzz_seeds OUTPUT_DIR [SAMPLE_DIR...]
 #include "base/MemoryFiles.h"
 #include "nitf/NitfFileHeader.h"
@@ -94,6 +94,10 @@ void CutFile(const fs::path& file)
         Write("jpeg", name,
               Prefix({{image.NBANDS == 3, 1}, {blocks, 1}, {side(image.NPPBH), 2}, {side(image.NPPBV), 2}, {1, 1},
                       {0, 1}}) + data);
+    else if (image.compressionKind == kJpeg2000)
+        Write("jpeg2000", name,
+              Prefix({{side(image.NCOLS), 2}, {side(image.NROWS), 2}, {image.drawnBandCount == 3, 1},
+                      {uint32_t(image.NBPP - 1), 1}}) + data);
     else if (image.compressionKind == kBiLevel)
         Write("bilevel", name,
               Prefix({{side(image.NCOLS), 2}, {side(image.NROWS), 2}, {image.COMRAT[0] == '1', 1}}) + data);

@@ -26,6 +26,23 @@ constexpr uint64_t kMaxBiLevelLibraryAllocation = uint64_t(256) << 20;
 // row at a time.
 constexpr uint64_t kMaxBlockCacheBytes = uint64_t(64) << 20;
 
+// JPEG 2000 ("C8") tiles decoded on demand and held, 8 bits a drawn sample,
+// least recently used dropped first.
+constexpr uint64_t kMaxJpeg2000TileCacheBytes = uint64_t(64) << 20;
+
+// OpenJPEG's memory while it decodes one tile: 4 bytes a sample in its tile
+// buffer and 4 more in its output image, for each decoded component. The
+// header alone sets the tile's size, so a larger tile is not decoded and
+// its rows fail. Its 8-bit samples (an eighth of this) always fit the cache.
+constexpr uint64_t kMaxJpeg2000TileDecodeBytes = uint64_t(256) << 20;
+
+// JPEG 2000 tiles of one codestream, and tiles times components: OpenJPEG
+// keeps about 6 KB of header state a tile and 1 KB a tile component from
+// the main header on, before any tile data is read. A codestream must also
+// hold the 14 bytes of a tile-part's SOT and SOD for each tile.
+constexpr uint64_t kMaxJpeg2000Tiles = 16384;
+constexpr uint64_t kMaxJpeg2000TileComponents = 65536;
+
 // The RPF subframes a draw holds, one row of them; larger subframes are read
 // a code row at a time.
 constexpr uint64_t kMaxSubframeCacheBytes = uint64_t(1) << 20;

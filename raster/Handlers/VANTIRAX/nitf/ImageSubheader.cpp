@@ -40,6 +40,8 @@ int32_t CompressionKindOf(const char IC[2])
         return kUncompressed;
     if (CodeIs(IC, "I1"))
         return kDownsampledJpeg;
+    if (CodeIs(IC, "C8"))
+        return kJpeg2000;
     if ((IC[0] == 'C' || IC[0] == 'M') && IC[1] >= '1' && IC[1] <= '5')
         return IC[1] - '0';
     return -1;
@@ -96,6 +98,7 @@ void CNitfImage::Release()
     ReleaseBlockCache();
     ClearParsed();
     decoder.FreeBitmaps();
+    jpeg2000.Release();
 }
 
 bool CNitfImage::ReadSubheader(CFileReader& reader, uint32_t offset)

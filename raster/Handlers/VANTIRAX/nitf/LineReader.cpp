@@ -5,6 +5,7 @@
 
 #include "base/CheckedRead.h"
 #include "base/Limits.h"
+#include "base/SampleBits.h"
 
 #include <algorithm>
 #include <cstring>
@@ -21,7 +22,7 @@ uint32_t CNitfImage::OutputPixelBytes() const
 {
     if (compressionKind == kBiLevel)
         return 1;
-    if (compressionKind == kUncompressed)
+    if (compressionKind == kUncompressed || compressionKind == kJpeg2000)
         return uint32_t(drawnBandCount);
     return uint32_t(NBPP) * uint32_t(NBANDS) / kByteBits;
 }
@@ -39,6 +40,8 @@ bool CNitfImage::ReadLine(CFileReader& reader, uint32_t row, int32_t firstColumn
     if (!isPrepared || out == nullptr || row >= uint32_t(NROWS) || firstColumn < 0 || lastColumn < firstColumn ||
         lastColumn >= NCOLS)
         return false;
+    if (compressionKind == kJpeg2000)
+        return jpeg2000.GetRow(reader, row, uint32_t(firstColumn), uint32_t(lastColumn), out);
     const bool decoded = compressionKind != kUncompressed;
     if (decoded && compressionKind != kBiLevel && compressionKind != kJpeg && compressionKind != kLosslessJpeg &&
         compressionKind != kDownsampledJpeg)
@@ -205,6 +208,7 @@ bool CNitfImage::ReadPackedSpan(CFileReader& reader, uint64_t planeStart, uint32
 void CNitfImage::ReleaseBlockCache()
 {
     blockCache.Release();
+    jpeg2000.ReleaseTiles();
 }
 
 // The strip of rows rowInBlock belongs to, in a plane of pixelBytes-byte
@@ -314,14 +318,6 @@ uint8_t CNitfImage::ConvertPixel(const uint8_t* pixel) const
 int32_t CNitfImage::SignificantBits() const
 {
     return ABPP >= 1 && ABPP <= NBPP && PJUST() != 'L' ? ABPP : NBPP;
-}
-
-// The 8 most significant of a value's significant low bits.
-uint8_t CNitfImage::TopByte(uint64_t value, int32_t significant)
-{
-    const uint64_t top = significant >= int32_t(kByteBits) ? value >> (significant - int32_t(kByteBits))
-                                                          : value << (int32_t(kByteBits) - significant);
-    return static_cast<uint8_t>(top & 0xFF);
 }
 
 // A compressed block's span, from the decoder: one bitmap per stored block

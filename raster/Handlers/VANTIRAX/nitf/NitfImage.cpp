@@ -31,11 +31,12 @@ bool CNitfImage::IsRgbLut() const
     return strncasecmp(IREP(), "RGB/LUT", 7) == 0;
 }
 
-// Uncompressed MONO and MULTI images show one band through the palette
-// unless they have R, G and B bands; compressed ones keep the decoder's bands.
+// Uncompressed and JPEG 2000 MONO and MULTI images show one band through the
+// palette unless they have R, G and B bands; other compressed ones keep the
+// decoder's bands.
 bool CNitfImage::IsPaletted() const
 {
-    if (compressionKind == kUncompressed && (isMono || isMulti))
+    if ((compressionKind == kUncompressed || compressionKind == kJpeg2000) && (isMono || isMulti))
         return drawnBandCount == 1;
     return IsRgbLut() || isMono;
 }
@@ -111,6 +112,9 @@ bool CNitfImage::PrepareData(CFileReader& reader, uint64_t dataLength)
     case kLosslessJpeg:
     case kDownsampledJpeg:
         served = PrepareJpegData(reader, dataLength);
+        break;
+    case kJpeg2000:
+        served = PrepareJpeg2000Data(reader, dataLength);
         break;
     case kVectorQuantized:
         served = NBANDS == 1 && IsPaletted();
@@ -244,6 +248,24 @@ bool CNitfImage::IndexMaskedStreams()
     return storedBlockCount > 0;
 }
 
+// A JPEG 2000 image shows the bands an uncompressed one of its IREP would,
+// wide samples reduced alike; its codestream's header must agree with the
+// subheader.
+bool CNitfImage::PrepareJpeg2000Data(CFileReader& reader, uint64_t dataLength)
+{
+    const bool rgbLut = IsRgbLut();
+    if (rgbLut ? NBANDS != 1 || NBPP > 8 : !isMono && !isMulti && !(isRgb && drawnBandCount == int32_t(kRgbTables)))
+        return false;
+    Jpeg2000Expectation expected;
+    expected.columns = uint32_t(NCOLS);
+    expected.rows = uint32_t(NROWS);
+    expected.components = uint32_t(NBANDS);
+    expected.largestPrecision = uint32_t(NBPP);
+    expected.significantBits = NBPP > 8 ? SignificantBits() : 0;
+    expected.drawn.assign(drawnBands, drawnBands + drawnBandCount);
+    return jpeg2000.Open(reader, dataOffset, std::min(dataLength, readLimit - dataOffset), expected);
+}
+
 void CNitfImage::AllocLineBuffer()
 {
     FreeVector(lineBuffer);
@@ -273,4 +295,5 @@ bool CNitfImage::OpenCompressed(CFileReader& reader, uint64_t dataLength)
 void CNitfImage::ReleaseDecoder()
 {
     decoder.FreeBitmaps();
+    jpeg2000.Release();
 }

@@ -7,6 +7,7 @@
 
 #include "base/FileReader.h"
 #include "base/SlotCache.h"
+#include "imaging/Jpeg2000Image.h"
 #include "imaging/LeadToolLibWrapper.h"
 #include "nitf/NitfBand.h"
 
@@ -33,6 +34,7 @@ enum NitfCompressionKind : int32_t {
     kVectorQuantized = 4,
     kLosslessJpeg = 5,
     kDownsampledJpeg = 7,
+    kJpeg2000 = 8,
 };
 
 constexpr uint32_t kBlockNotStored = 0xFFFFFFFF; // block record of a block the file leaves out
@@ -63,6 +65,7 @@ public:
     uint16_t version21 = 0;         // 1 in NITF 2.1 (from the file header), set before parsing
     uint32_t subheaderLength = 0;   // LISH of the segment, set before parsing; 0 when not known
     CLeadToolLibWrapper decoder;
+    CJpeg2000Image jpeg2000;        // IC "C8": decodes tiles as rows need them
     char subheaderText[kSubheaderFrontSize] = {};
     std::unique_ptr<char[]> IGEOLO; // 60 characters and a NUL, or null without corners
     int32_t NICOM = 0;
@@ -160,6 +163,7 @@ private:
     bool OneBitIndices() const;
     bool DataFitsFile() const;
     bool PrepareJpegData(CFileReader& reader, uint64_t dataLength);
+    bool PrepareJpeg2000Data(CFileReader& reader, uint64_t dataLength);
     bool IndexMaskedStreams();
     uint64_t BandBlockBytes() const;
 
@@ -182,6 +186,5 @@ private:
     void ScatterBand(const uint8_t* source, uint32_t sourceStride, uint32_t n, int32_t band, uint8_t* out) const;
     uint8_t ConvertPixel(const uint8_t* pixel) const;
     int32_t SignificantBits() const;
-    static uint8_t TopByte(uint64_t value, int32_t significant);
     bool ReadCompressedBlock(uint32_t block, uint32_t rowInBlock, uint32_t c0, uint32_t c1, uint8_t* out);
 };

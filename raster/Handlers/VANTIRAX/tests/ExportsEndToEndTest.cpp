@@ -36,6 +36,8 @@ const Outcome kOutcomes[] = {
     {"compressed_jpeg_grey", 1, 1, kStatusOk, kPixelGreyPaletted, 256},
     {"compressed_jpeg_colour", 1, 1, kStatusOk, kPixelDirect, 0},
     // GDAL gives black 1 and white 0 (its colour table says the reverse).
+    {"compressed_jpeg2000_grey12", 1, 1, kStatusOk, kPixelGreyPaletted, 256, "", 4},
+    {"compressed_jpeg2000_rgb_jp2", 1, 1, kStatusOk, kPixelDirect, 0},
     {"compressed_bilevel_1d", 1, 1, kStatusOk, kPixelGreyPaletted, 256, "-scale 0 1 255 0"},
     {"compressed_bilevel_2d", 1, 1, kStatusOk, kPixelGreyPaletted, 256, "-scale 0 1 255 0"},
     {"cadrg_big_endian", 1, 1, kStatusOk, kPixelPaletted, 217, "", 0, true},
@@ -49,7 +51,7 @@ const Outcome kOutcomes[] = {
     {"mono16", 1, 1, kStatusOk, kPixelGreyPaletted, 256, "", 4},
     {"masked_blocks_utm", 1, 1, kStatusOk, kPixelGreyPaletted, 256},
     {"rpf_short_colour_table", 1, 0, kStatusFailed}, {"rpf_sections_missing", 1, 0, kStatusFailed},
-    {"dpcm", 0, 1, kStatusFailed}, {"jpeg2000", 0, 0, kStatusFailed}, {"real_pixels", 0, 1, kStatusFailed},
+    {"dpcm", 0, 1, kStatusFailed}, {"jpeg2000", 0, 1, kStatusFailed}, {"real_pixels", 0, 1, kStatusFailed},
     {"cut_header", 0, 0, kHostStatus},
     {"jpeg_streams_larger_than_blocks", 1, 1, kStatusOk, kPixelGreyPaletted, 256, nullptr},
 };

@@ -1,6 +1,7 @@
 #include "tests/SampleFiles.h"
 
 #include "tests/fixtures/BiLevelWriter.h"
+#include "tests/fixtures/Jpeg2000Writer.h"
 #include "tests/fixtures/JpegBlockWriter.h"
 #include "tests/fixtures/NitfImageWriter.h"
 #include "tests/fixtures/RpfFrameWriter.h"
@@ -87,6 +88,22 @@ std::string Jpeg(int components, unsigned seed, uint32_t streamScale = 1)
     return BuildImageFile(plan, AsString(BuildNitfJpegData(streams, NitfApp6Plan{2, 2, 0, uint8_t(grey ? 0 : 2)})));
 }
 
+// JPEG 2000 in 32 x 32 tiles, the subheader's blocks: 12-bit grey samples
+// in NBPP 16 (ABPP 12), or R, G, B bands of 8 bits in a JP2 file.
+std::string Jpeg2000(bool colour, unsigned seed)
+{
+    NitfImagePlan plan = Image(colour ? "RGB" : "MONO", colour ? 3 : 1, 'B');
+    plan.IC = "C8";
+    plan.COMRAT = "N001";
+    plan.NBPP = colour ? 8 : 16;
+    plan.ABPP = colour ? 8 : 12;
+    std::vector<uint16_t> samples(70 * 90 * plan.bands.size());
+    for (uint32_t i = 0; i < samples.size(); ++i)
+        samples[i] = uint16_t((i / 90 * 3 + i % 90 * 5 + seed * 11) * (colour ? 1 : 29) % (colour ? 256 : 4096));
+    const std::string codestream = EncodeJpeg2000(90, 70, uint32_t(plan.bands.size()), colour ? 8 : 12, 32, samples);
+    return BuildImageFile(plan, colour ? Jp2File(codestream) : codestream);
+}
+
 std::string BiLevel(bool twoDimensional, unsigned seed)
 {
     std::vector<uint8_t> packed(size_t(kFaxWidth / 8) * kFaxHeight);
@@ -115,6 +132,8 @@ std::vector<SampleFile> FilesOfEveryKind(unsigned seed)
     return {
         {"compressed_jpeg_grey", Jpeg(1, seed)},
         {"compressed_jpeg_colour", Jpeg(3, seed)},
+        {"compressed_jpeg2000_grey12", Jpeg2000(false, seed)},
+        {"compressed_jpeg2000_rgb_jp2", Jpeg2000(true, seed)},
         {"compressed_bilevel_1d", BiLevel(false, seed)},
         {"compressed_bilevel_2d", BiLevel(true, seed)},
         {"cadrg_big_endian", Frame(RpfProduct::Cadrg, true, cadrgMasked)},
@@ -154,7 +173,7 @@ std::vector<SampleFile> HostileFiles()
     return {{"rpf_short_colour_table", BuildRpfFrame(shortTable).bytes},
             {"rpf_sections_missing", BuildNitfFile(noSections)},
             {"dpcm", dpcm}, // parses, never served
-            {"jpeg2000", jpeg2000}, // not even parsed
+            {"jpeg2000", jpeg2000}, // parses; no codestream
             {"real_pixels", withIC("NC", 256)},
             {"cut_header", cut},
             {"jpeg_streams_larger_than_blocks", Jpeg(1, 0, 16)}};

@@ -10,6 +10,7 @@
 #include "tests/fixtures/BiLevelWriter.h"
 #include "tests/fixtures/Command.h"
 #include "tests/fixtures/Corpus.h"
+#include "tests/fixtures/Jpeg2000Writer.h"
 #include "tests/fixtures/JpegBlockWriter.h"
 #include "tests/fixtures/NitfImageWriter.h"
 #include "tests/fixtures/TempFiles.h"
@@ -211,8 +212,8 @@ TEST(Image, RefusesWhatTheFileCannotBackAndWhatIsNotServed)
 
 // A compressed image is served only when the decoder's rows (one byte per pixel, or three for
 // NBPP x NBANDS 24) are what the host reads by the pixel kind. An 8 x 8 frame fills a 16 x 16
-// "I1" image (JpegDecode tests the pixels), but no "C3" block. Arithmetic DPCM and JPEG 2000 are
-// not served; vector-quantised data outside an RPF frame draws no row.
+// "I1" image (JpegDecode tests the pixels), but no "C3" block. Arithmetic DPCM, and "C8" data that
+// is no JPEG 2000 codestream, are not served; vector-quantised data outside an RPF frame draws no row.
 TEST(Image, CompressedImagesServeOnlyRowsTheirDecoderFills)
 {
     JpegBlockPlan lossless;
@@ -290,6 +291,45 @@ TEST(Image, JpegBlockStreamsAsEncodersWriteThem)
             for (uint32_t column = 0; column < 2 * kSide; ++column)
                 expected.push_back(decoded[row / kSide * 2 + column / kSide][row % kSide * kSide + column % kSide]);
             EXPECT_EQ(loaded.Row(row), expected) << "row " << row;
+        }
+    }
+}
+
+// JPEG 2000 in 2 x 2 tiles of 16 on a 32 x 24 image: drawn as written, refused at open when its header
+// disagrees with the subheader or could not be backed by the data, or served with the rows of a tile
+// that does not decode failing (the last tile cut off; one tile of 10^10 pixels, never decoded).
+TEST(Image, Jpeg2000HeadersAgreeWithTheSubheaderOrAreRefused)
+{
+    std::vector<uint16_t> samples(32 * 24);
+    for (size_t i = 0; i < samples.size(); ++i)
+        samples[i] = uint16_t(i * 7 % 256);
+    const std::string codestream = EncodeJpeg2000(32, 24, 1, 8, 16, samples);
+    const auto siz = [&](size_t at, const std::string& bytes) { return std::string(codestream).replace(at, bytes.size(), bytes); };
+    const std::string huge("\0\x01\x86\xA0", 4); // 100000
+    enum Outcome { kDrawn, kRefused, kLastTileFails, kRowsFail };
+    struct Case { const char* what; std::string data; Outcome outcome; int32_t side = 0, NBPP = 8; size_t bands = 1; };
+    for (const Case& c : std::vector<Case>{
+             {"as written", codestream, kDrawn},
+             {"in a JP2 file", Jp2File(codestream), kDrawn},
+             {"NCOLS 24", codestream, kRefused, 24},
+             {"NBANDS 3", codestream, kRefused, 0, 8, 3},
+             {"NBPP 4", codestream, kRefused, 0, 4},
+             {"17-bit samples", siz(42, "\x10"), kRefused},
+             {"signed samples", siz(42, "\x87"), kRefused},
+             {"tiles 0 wide", siz(24, std::string(4, '\0')), kRefused},
+             {"tiles of a pixel, more than the data holds", siz(24, std::string("\0\0\0\1\0\0\0\1", 8)), kRefused},
+             {"a jp2c box past the end", Jp2File(codestream + "x").substr(0, codestream.size() + 20), kRefused},
+             {"the last tile cut off", codestream.substr(0, codestream.size() - 40), kLastTileFails},
+             {"one tile of 100000 x 100000", siz(24, huge + huge).replace(8, 8, huge + huge), kRowsFail, 100000}}) {
+        NitfImagePlan plan = c.side ? Plan(c.side, c.side, "C8") : Plan(24, 32, "C8", 2, 2, 16, 16);
+        plan.NBPP = c.NBPP;
+        plan.bands.resize(c.bands);
+        LoadedImage loaded(BuildImageFile(plan, c.data));
+        ASSERT_EQ(loaded.Open(), c.outcome != kRefused) << c.what;
+        for (uint32_t row = 0; c.outcome != kRefused && row < 24; ++row) {
+            const bool fails = c.outcome == kRowsFail || (c.outcome == kLastTileFails && row >= 16);
+            EXPECT_EQ(loaded.Row(row, 0, 31), fails ? Bytes() : Bytes(samples.begin() + row * 32, samples.begin() + row * 32 + 32))
+                << c.what << " row " << row;
         }
     }
 }
