@@ -15,6 +15,8 @@ struct CommandLine {
     unsigned jobs = 1;           // --jobs N
     std::string format = "tif";  // --format tif|png
     bool text = false;           // --text
+    bool overviews = true;       // --no-overviews clears it
+    bool worldFile = false;      // --world-file
 };
 
 // The options of command, each "--name value" or "--name=value". False with

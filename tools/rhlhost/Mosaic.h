@@ -12,6 +12,7 @@
 
 namespace host {
 
-int RunMosaic(const Exports& rh, const std::vector<std::string>& inputs, const std::string& output);
+// Without overviews, the full resolution alone.
+int RunMosaic(const Exports& rh, const std::vector<std::string>& inputs, const std::string& output, bool overviews);
 
 } // namespace host
