@@ -194,6 +194,7 @@ const Command kCommands[] = {
     {{"info", "IN/frame.ntf", "--text", "--text"}, 2, {"--text is given twice"}, {}},
     {{"info", "IN/frame.ntf", "--jobs", "2"}, 2, {"--jobs does not apply to info"}, {}},
     {{"render", "IN/frame.ntf", "OUT/frame.tif", "--format", "png"}, 2, {"--format does not apply to render without -o"}, {}},
+    {{"render", "IN/frame.ntf", "OUT/frame.tif", "--world-file"}, 2, {"--world-file goes with PNG output"}, {}},
     {{"mosaic", "-o", "OUT/m.png", "IN"}, 2, {"mosaic writes .tif or .tiff files"}, {}},
     {{"render", "-o", "OUT", "IN/notes.txt"}, 1, {"IN/notes.txt: the handler does not recognise it", "1 files: 0 rendered"}, {}},
     {{"mosaic", "-o", "OUT/m.tif", "IN/utm.ntf"}, 1, {"no frame to place in the mosaic"}, {}},
