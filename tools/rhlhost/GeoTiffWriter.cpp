@@ -141,7 +141,7 @@ void AverageBlock(const uint8_t* const* block, size_t count, unsigned samples, b
         const bool shows = !alpha || block[i][3] != 0;
         shown += shows;
         for (unsigned s = 0; s < samples; ++s)
-            sums[s] += shows || s == 3 ? block[i][s] : 0;
+            sums[s] += (shows || s == 3) ? block[i][s] : 0;
     }
     for (unsigned s = 0; s < samples; ++s) {
         const unsigned n = alpha && s < 3 ? shown : unsigned(count);
