@@ -71,7 +71,7 @@ private:
             progress_.Report("cannot create the directory " + output.parent_path().string() + ": " + error.message());
             return {FileResult::Failed, 0};
         }
-        return Rendered(file, name, RenderFile(rh_, file.path, output.string(), format_, options_.window));
+        return Rendered(file, name, RenderFile(rh_, file.path, output.string(), format_, options_.render));
     }
 
     FileOutcome Rendered(const InputFile& file, const std::string& name, const RenderOutcome& outcome)
@@ -122,7 +122,7 @@ BatchOptions BatchOptionsFrom(const CommandLine& line)
     options.outputDirectory = line.output;
     options.extension = "." + line.format;
     options.jobs = line.jobs;
-    options.window = line.window;
+    options.render = {line.window, line.overviews, line.worldFile};
     return options;
 }
 

@@ -7,6 +7,7 @@
 
 #include "CommandLine.h"
 #include "HandlerLibrary.h"
+#include "Render.h"
 
 namespace host {
 
@@ -15,7 +16,7 @@ struct BatchOptions {
     std::string outputDirectory;
     std::string extension = ".tif";
     unsigned jobs = 1;
-    Window window;
+    RenderOptions render;
 };
 
 BatchOptions BatchOptionsFrom(const CommandLine& line);

@@ -23,6 +23,14 @@ bool ApplyOption(const std::vector<std::string>& args, size_t& i, CommandLine& l
         line.text = true;
         return true;
     }
+    if (name == "--no-overviews") {
+        line.overviews = false;
+        return true;
+    }
+    if (name == "--world-file") {
+        line.worldFile = true;
+        return true;
+    }
     if (i + 1 >= args.size()) {
         message = name + " needs a value";
         return false;
@@ -56,9 +64,10 @@ bool Applies(const std::string& command, const std::string& option, bool batch, 
     if (command == "dump")
         return option == "--window";
     if (command == "render")
-        return option == "--window" || option == "-o" || (batch && (option == "--jobs" || option == "--format"));
+        return option == "--window" || option == "-o" || option == "--no-overviews" || option == "--world-file" ||
+               (batch && (option == "--jobs" || option == "--format"));
     if (command == "mosaic")
-        return option == "-o" || option == "--toc" || (toc && option == "--product");
+        return option == "-o" || option == "--no-overviews" || option == "--toc" || (toc && option == "--product");
     return false;
 }
 

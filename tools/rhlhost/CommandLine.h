@@ -17,6 +17,8 @@ struct CommandLine {
     bool text = false;           // --text
     std::string toc;             // --toc A.TOC: the mosaic's table of contents
     unsigned product = 0;        // --product N: its boundary rectangle, from 1
+    bool overviews = true;       // --no-overviews clears it
+    bool worldFile = false;      // --world-file
 };
 
 // The options of command, each "--name value" or "--name=value". False with

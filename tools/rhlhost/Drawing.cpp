@@ -1,7 +1,6 @@
 #include "Drawing.h"
 
 #include <cstdio>
-#include <cstring>
 
 namespace host {
 namespace {
@@ -43,36 +42,45 @@ std::string OpenFile::RefusalReason() const
            std::to_string(image.status) + ")";
 }
 
-bool DrawWindow(const Exports& rh, OpenFile& file, Window window, Pixels& pixels, std::string& message)
+WindowDraw::~WindowDraw()
 {
-    if (!ResolveWindow(file.image, window)) {
-        message = "the window lies outside the " + std::to_string(file.image.width) + " x " +
-                  std::to_string(file.image.height) + " image";
+    if (started_)
+        rh_.endDraw(file_.Handle().bytes);
+}
+
+bool WindowDraw::Start(Window window, std::string& message)
+{
+    if (!ResolveWindow(file_.image, window)) {
+        message = "the window lies outside the " + std::to_string(file_.image.width) + " x " +
+                  std::to_string(file_.image.height) + " image";
         return false;
     }
     const int32_t rect[4] = {window.x0, window.y0, window.x1, window.y1};
     uint32_t rowWidth = 0;
-    if (rh.startDraw(file.Handle().bytes, nullptr, rect, 1.0, &rowWidth) != 1) {
+    if (rh_.startDraw(file_.Handle().bytes, nullptr, rect, 1.0, &rowWidth) != 1) {
         message = "the handler refused to start the draw";
         return false;
     }
-    pixels.x0 = uint32_t(window.x0);
-    pixels.y0 = uint32_t(window.y0);
-    pixels.width = rowWidth;
-    pixels.height = static_cast<uint32_t>(window.y1 - window.y0);
-    pixels.bytesPerPixel = BytesPerPixel(file.image.pixelKind);
-    const size_t rowBytes = size_t(rowWidth) * pixels.bytesPerPixel;
-    pixels.bytes.assign(rowBytes * pixels.height, 0);
-    for (uint32_t i = 0; i < pixels.height; ++i) {
-        uint8_t* row = nullptr;
-        uint16_t flag = 0;
-        if (rh.getLine(file.Handle().bytes, pixels.y0 + i, &row, &flag) == 1 && row != nullptr)
-            std::memcpy(pixels.bytes.data() + i * rowBytes, row, rowBytes);
-        else
-            ++pixels.failedRows;
-    }
-    rh.endDraw(file.Handle().bytes);
+    started_ = true;
+    x0 = uint32_t(window.x0);
+    y0 = uint32_t(window.y0);
+    width = rowWidth;
+    height = static_cast<uint32_t>(window.y1 - window.y0);
+    bytesPerPixel = BytesPerPixel(file_.image.pixelKind);
     return true;
+}
+
+const uint8_t* WindowDraw::NextRow()
+{
+    if (!started_ || nextRow_ >= height)
+        return nullptr;
+    uint8_t* row = nullptr;
+    uint16_t flag = 0;
+    if (rh_.getLine(file_.Handle().bytes, y0 + nextRow_++, &row, &flag) == 1 && row != nullptr)
+        return row;
+    ++failedRows;
+    zeros_.assign(RowBytes(), 0);
+    return zeros_.data();
 }
 
 } // namespace host

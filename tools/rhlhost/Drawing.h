@@ -39,15 +39,33 @@ private:
     HandleRecord handle_;
 };
 
-// Rows of a drawn window as delivered; rows that failed to decode stay zero.
-struct Pixels {
+// A draw of a window, its rows taken one at a time from the top, never the
+// whole window at once; RH_EndDraw when it goes away.
+class WindowDraw {
+public:
+    WindowDraw(const Exports& rh, OpenFile& file) : rh_(rh), file_(file) {}
+    ~WindowDraw();
+    WindowDraw(const WindowDraw&) = delete;
+    WindowDraw& operator=(const WindowDraw&) = delete;
+
+    // False with a message when the window leaves the image or the handler refuses it.
+    bool Start(Window window, std::string& message);
+    // The next row as delivered (valid until the next call), or zeros when it
+    // failed to decode; null past the last row.
+    const uint8_t* NextRow();
+    size_t RowBytes() const { return size_t(width) * bytesPerPixel; }
+
     uint32_t x0 = 0, y0 = 0; // the window's place in the image
     uint32_t width = 0, height = 0;
     size_t bytesPerPixel = 1;
-    std::vector<uint8_t> bytes;
     uint32_t failedRows = 0;
-};
 
-bool DrawWindow(const Exports& rh, OpenFile& file, Window window, Pixels& pixels, std::string& message);
+private:
+    const Exports& rh_;
+    OpenFile& file_;
+    bool started_ = false;
+    uint32_t nextRow_ = 0;
+    std::vector<uint8_t> zeros_; // a failed row
+};
 
 } // namespace host

@@ -4,10 +4,29 @@
 
 namespace host {
 
-bool WriteGeoTiff(const std::string& path, const Raster& /*raster*/, const GeoReference* /*geo*/, std::string& message)
+struct GeoTiffWriter::Levels {};
+
+GeoTiffWriter::GeoTiffWriter(const std::string& /*path*/, const Raster& /*raster*/, const GeoReference* /*geo*/,
+                             bool /*overviews*/)
 {
-    message = "cannot write " + path + ": GeoTIFF output is not built into this host";
+}
+
+GeoTiffWriter::~GeoTiffWriter() = default;
+
+bool GeoTiffWriter::Open(std::string& message)
+{
+    message = "GeoTIFF output is not built into this host";
     return false;
+}
+
+bool GeoTiffWriter::AddRow(const uint8_t* /*row*/, std::string& message)
+{
+    return Open(message);
+}
+
+bool GeoTiffWriter::Finish(std::string& message)
+{
+    return Open(message);
 }
 
 } // namespace host

@@ -13,16 +13,13 @@
 
 namespace host {
 
-int RunMosaic(const Exports& rh, const std::vector<std::string>& inputs, const std::string& output);
+// Without overviews, the full resolution alone.
+int RunMosaic(const Exports& rh, const std::vector<std::string>& inputs, const std::string& output, bool overviews);
 
 // The frames of one boundary rectangle of an A.TOC, each where its frame file
 // index record puts it on the grid the rectangle spans; frames missing on
 // disk or refused are reported and left as nodata.
-int RunTocMosaic(const Exports& rh, const std::string& tocPath, size_t product, const std::string& output);
-
-// Draws the frames onto a canvas of the grid (see RunMosaic for its kind) and
-// writes it; false with a message when it cannot be written.
-bool PaintAndWrite(const Exports& rh, const std::vector<MosaicFrame>& frames, const MosaicGrid& grid,
-                   const std::string& output, uint32_t& failedRows, std::string& message);
+int RunTocMosaic(const Exports& rh, const std::string& tocPath, size_t product, const std::string& output,
+                 bool overviews);
 
 } // namespace host

@@ -2,7 +2,6 @@
 
 #include <cerrno>
 #include <csetjmp>
-#include <cstdio>
 #include <cstring>
 #include <png.h>
 
@@ -21,49 +20,65 @@ int ColourType(unsigned channels)
     }
 }
 
-// libpng reports errors by longjmp; no C++ object with a destructor lives
-// across the setjmp in this function.
-bool WriteRows(FILE* file, uint32_t width, uint32_t height, unsigned channels, const uint8_t* pixels)
-{
-    png_structp png = png_create_write_struct(PNG_LIBPNG_VER_STRING, nullptr, nullptr, nullptr);
-    if (png == nullptr)
-        return false;
-    png_infop info = png_create_info_struct(png);
-    if (info == nullptr || setjmp(png_jmpbuf(png))) {
-        png_destroy_write_struct(&png, &info);
-        return false;
-    }
-    png_init_io(png, file);
-    png_set_IHDR(png, info, width, height, 8, ColourType(channels),
-                 PNG_INTERLACE_NONE, PNG_COMPRESSION_TYPE_DEFAULT, PNG_FILTER_TYPE_DEFAULT);
-    png_write_info(png, info);
-    const size_t rowBytes = size_t(width) * channels;
-    for (uint32_t row = 0; row < height; ++row)
-        png_write_row(png, pixels + row * rowBytes);
-    png_write_end(png, nullptr);
-    png_destroy_write_struct(&png, &info);
-    return true;
-}
-
 } // namespace
 
-bool WritePng(const std::string& path, uint32_t width, uint32_t height, unsigned channels,
-              const std::vector<uint8_t>& pixels, std::string& message)
+// libpng reports errors by longjmp: every function here that calls it sets
+// its jump first, and no C++ object with a destructor lives across it.
+
+PngWriter::~PngWriter()
+{
+    png_destroy_write_struct(&png_, &info_);
+    if (file_ != nullptr)
+        std::fclose(file_);
+}
+
+bool PngWriter::Open(const std::string& path, uint32_t width, uint32_t height, unsigned channels,
+                     std::string& message)
 {
     if (width == 0 || height == 0) {
         message = "the window is empty";
         return false;
     }
-    FILE* file = std::fopen(path.c_str(), "wb");
-    if (file == nullptr) {
+    file_ = std::fopen(path.c_str(), "wb");
+    if (file_ == nullptr) {
         message = std::strerror(errno);
         return false;
     }
-    bool written = WriteRows(file, width, height, channels, pixels.data());
-    written = std::fclose(file) == 0 && written;
-    if (!written)
+    png_ = png_create_write_struct(PNG_LIBPNG_VER_STRING, nullptr, nullptr, nullptr);
+    info_ = png_ == nullptr ? nullptr : png_create_info_struct(png_);
+    if (info_ == nullptr || setjmp(png_jmpbuf(png_))) {
+        failed_ = true;
         message = "PNG encoding failed";
-    return written;
+        return false;
+    }
+    png_init_io(png_, file_);
+    png_set_IHDR(png_, info_, width, height, 8, ColourType(channels), PNG_INTERLACE_NONE,
+                 PNG_COMPRESSION_TYPE_DEFAULT, PNG_FILTER_TYPE_DEFAULT);
+    png_write_info(png_, info_);
+    return true;
+}
+
+bool PngWriter::AddRow(const uint8_t* row)
+{
+    if (failed_ || setjmp(png_jmpbuf(png_))) {
+        failed_ = true;
+        return false;
+    }
+    png_write_row(png_, row);
+    return true;
+}
+
+bool PngWriter::Finish(std::string& message)
+{
+    if (!failed_ && setjmp(png_jmpbuf(png_)) == 0)
+        png_write_end(png_, nullptr);
+    else
+        failed_ = true;
+    const bool closed = std::fclose(file_) == 0;
+    file_ = nullptr;
+    if (failed_ || !closed)
+        message = "PNG encoding failed";
+    return !failed_ && closed;
 }
 
 } // namespace host

@@ -39,13 +39,12 @@ int MaskedIndex(const std::vector<uint8_t>& palette)
     return palette.size() == kRpfPaletteEntries * 3 ? kRpfMaskedIndex : kNoNodata;
 }
 
-Raster RasterFromPixels(const OpenedImage& image, const Pixels& pixels)
+Raster RasterOf(const OpenedImage& image, uint32_t width, uint32_t height)
 {
     Raster raster;
-    raster.width = pixels.width;
-    raster.height = pixels.height;
-    raster.pixels = pixels.bytes;
-    if (pixels.bytesPerPixel == 3) {
+    raster.width = width;
+    raster.height = height;
+    if (BytesPerPixel(image.pixelKind) == 3) {
         raster.colour = Colour::Rgb;
         return raster;
     }
@@ -55,8 +54,8 @@ Raster RasterFromPixels(const OpenedImage& image, const Pixels& pixels)
     // An RPF frame stays paletted even when grey: its entry 216 is the masked value, not a grey level.
     const int masked = MaskedIndex(image.palette);
     if (masked == kNoNodata && AllGrey(image.palette)) {
-        for (uint8_t& value : raster.pixels)
-            value = image.palette[EntryOf(value, entries) * 3];
+        for (size_t index = 0; index < kMaxPaletteEntries; ++index)
+            raster.greys.push_back(image.palette[EntryOf(uint8_t(index), entries) * 3]);
         return raster;
     }
     raster.colour = Colour::Palette;
@@ -64,6 +63,12 @@ Raster RasterFromPixels(const OpenedImage& image, const Pixels& pixels)
                           image.palette.begin() + std::min(entries, kMaxPaletteEntries) * 3);
     raster.nodata = masked;
     return raster;
+}
+
+void ToRasterRow(const Raster& raster, uint8_t* row)
+{
+    for (size_t i = 0; !raster.greys.empty() && i < raster.width; ++i)
+        row[i] = raster.greys[row[i]];
 }
 
 Raster Expanded(const Raster& raster)
@@ -74,16 +79,24 @@ Raster Expanded(const Raster& raster)
     rgb.colour = raster.nodata == kNoNodata ? Colour::Rgb : Colour::Rgba;
     rgb.palette.clear();
     rgb.nodata = kNoNodata;
-    const size_t entries = raster.palette.size() / 3, samples = rgb.Samples();
-    rgb.pixels.assign(raster.pixels.size() * samples, 0);
-    for (size_t i = 0; i < raster.pixels.size(); ++i) {
-        if (raster.pixels[i] == raster.nodata)
-            continue; // transparent black, as a mosaic leaves masked pixels
-        std::memcpy(&rgb.pixels[i * samples], &raster.palette[EntryOf(raster.pixels[i], entries) * 3], 3);
-        if (samples == 4)
-            rgb.pixels[i * 4 + 3] = kOpaque;
-    }
     return rgb;
+}
+
+void ExpandRow(const Raster& raster, const uint8_t* row, uint8_t* expanded)
+{
+    if (raster.colour != Colour::Palette) {
+        std::memcpy(expanded, row, raster.RowBytes());
+        return;
+    }
+    const size_t entries = raster.palette.size() / 3, samples = raster.nodata == kNoNodata ? 3 : 4;
+    std::memset(expanded, 0, raster.width * samples); // transparent black, as a mosaic leaves masked pixels
+    for (size_t i = 0; i < raster.width; ++i) {
+        if (row[i] == raster.nodata)
+            continue;
+        std::memcpy(&expanded[i * samples], &raster.palette[EntryOf(row[i], entries) * 3], 3);
+        if (samples == 4)
+            expanded[i * 4 + 3] = kOpaque;
+    }
 }
 
 } // namespace host

@@ -1,8 +1,8 @@
-// A drawn image ready for an image file: grey, palette indices with their
-// colour map, RGB, or RGB with alpha.
+// What an image file holds of a drawn window: grey, palette indices with
+// their colour map, RGB, or RGB with alpha; its rows pass through one at a time.
 #pragma once
 
-#include "Drawing.h"
+#include "HandlerLibrary.h"
 
 #include <cstdint>
 #include <vector>
@@ -21,23 +21,30 @@ constexpr uint8_t kOpaque = 255; // alpha
 struct Raster {
     uint32_t width = 0, height = 0;
     Colour colour = Colour::Grey;
-    std::vector<uint8_t> pixels;  // rows of width x Samples() bytes
     std::vector<uint8_t> palette; // Colour::Palette: entries x (r, g, b), at most 256
     int nodata = kNoNodata;       // Colour::Palette: the index that marks no data
+    std::vector<uint8_t> greys;   // rows delivered as indices of a grey palette: each index's grey
 
     unsigned Samples() const;
+    size_t RowBytes() const { return size_t(width) * Samples(); }
 };
 
 // The palette index that means "masked" (the RPF frame's entry 216), or kNoNodata.
 int MaskedIndex(const std::vector<uint8_t>& palette);
 
-// Colour palettes and every RPF frame's palette keep their indices and colour
-// map; other palettes whose entries are all grey become grey values; RGB rows
-// stay RGB; rows without palette are grey.
-Raster RasterFromPixels(const OpenedImage& image, const Pixels& pixels);
+// The raster of a width x height window of the image: colour palettes and
+// every RPF frame's palette keep their indices and colour map; other palettes
+// whose entries are all grey become grey values; RGB rows stay RGB; rows
+// without palette are grey.
+Raster RasterOf(const OpenedImage& image, uint32_t width, uint32_t height);
 
-// Palette indices replaced by their colours, for formats written without a
-// colour map; with a nodata index, RGBA with the masked pixels transparent.
+// A delivered row in the raster's values, in place: grey palettes' indices become their greys.
+void ToRasterRow(const Raster& raster, uint8_t* row);
+
+// The raster with palette indices replaced by their colours, for formats
+// written without a colour map; with a nodata index, RGBA with the masked
+// pixels transparent black. ExpandRow fills a row of it from a row of the raster.
 Raster Expanded(const Raster& raster);
+void ExpandRow(const Raster& raster, const uint8_t* row, uint8_t* expanded);
 
 } // namespace host

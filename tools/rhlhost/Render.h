@@ -1,5 +1,6 @@
 // Renders one file, or a window of it, to a GeoTIFF, a PNG or the raw rows,
-// through a temporary name so that a failure leaves no output behind.
+// each row written as it arrives, through a temporary name so that a failure
+// leaves no output behind.
 #pragma once
 
 #include "Drawing.h"
@@ -12,6 +13,15 @@ enum class OutputFormat { GeoTiff, Png, Raw };
 
 // ".tif" / ".tiff": GeoTIFF, ".png": PNG, ".raw": the rows (any case); false for other names.
 bool FormatFromName(const std::string& output, OutputFormat& format);
+
+struct RenderOptions {
+    Window window;
+    bool overviews = true;  // GeoTIFF: internal overviews when large (--no-overviews: none)
+    bool worldFile = false; // PNG: the NAME.pgw world file beside it (--world-file)
+};
+
+// False with a message when an option does not go with the format.
+bool OptionsFitFormat(OutputFormat format, const RenderOptions& options, std::string& message);
 
 enum class RenderStatus {
     Rendered, // written; some rows may have failed to decode
@@ -27,6 +37,6 @@ struct RenderOutcome {
 };
 
 RenderOutcome RenderFile(const Exports& rh, const std::string& input, const std::string& output,
-                         OutputFormat format, const Window& window);
+                         OutputFormat format, const RenderOptions& options);
 
 } // namespace host

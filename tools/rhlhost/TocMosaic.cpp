@@ -3,6 +3,7 @@
 #include "ExitCodes.h"
 #include "FileWalk.h"
 #include "Mosaic.h"
+#include "MosaicCanvas.h"
 #include "TableOfContents.h"
 
 #include <algorithm>
@@ -100,7 +101,8 @@ bool AddTocFrame(const Exports& rh, const std::string& path, const TocFrame& ent
 
 } // namespace
 
-int RunTocMosaic(const Exports& rh, const std::string& tocPath, size_t product, const std::string& output)
+int RunTocMosaic(const Exports& rh, const std::string& tocPath, size_t product, const std::string& output,
+                 bool overviews)
 {
     TableOfContents toc;
     std::string message;
@@ -113,7 +115,8 @@ int RunTocMosaic(const Exports& rh, const std::string& tocPath, size_t product, 
     MosaicGrid grid;
     if (!GridOfRectangle(rectangle, grid, message))
         return Fail(kExitRefused, tocPath + ": product " + std::to_string(product) + ": " + message);
-    std::vector<MosaicFrame> frames;
+    MosaicFrames placed;
+    std::vector<MosaicFrame>& frames = placed.frames;
     size_t missing = 0;
     for (const TocFrame& entry : toc.frames) {
         if (entry.rectangle != product - 1)
@@ -125,7 +128,7 @@ int RunTocMosaic(const Exports& rh, const std::string& tocPath, size_t product, 
             ++missing;
     }
     uint32_t failedRows = 0;
-    if (!PaintAndWrite(rh, frames, grid, output, failedRows, message))
+    if (!WriteMosaic(rh, placed, grid, output, overviews, failedRows, message))
         return Fail(kExitRefused, message);
     std::fprintf(stderr, "rhlhost: %s: %zu frames on %u x %u pixels, %zu missing or refused\n", output.c_str(),
                  frames.size(), grid.width, grid.height, missing);

@@ -5,10 +5,10 @@
 //   rhlhost [--handler PATH] probe FILE...
 //   rhlhost [--handler PATH] info FILE [--text]
 //   rhlhost [--handler PATH] dump FILE OUT.raw [--window X0,Y0,X1,Y1]
-//   rhlhost [--handler PATH] render FILE OUT.tif|OUT.png [--window X0,Y0,X1,Y1]
+//   rhlhost [--handler PATH] render FILE OUT.tif|OUT.png [--window X0,Y0,X1,Y1] [--no-overviews|--world-file]
 //   rhlhost [--handler PATH] render [--jobs N] [--format tif|png] [--window X0,Y0,X1,Y1] -o OUTDIR FILE_OR_DIR...
-//   rhlhost [--handler PATH] mosaic -o OUT.tif FILE_OR_DIR...
-//   rhlhost [--handler PATH] mosaic -o OUT.tif --toc A.TOC --product N
+//   rhlhost [--handler PATH] mosaic [--no-overviews] -o OUT.tif FILE_OR_DIR...
+//   rhlhost [--handler PATH] mosaic [--no-overviews] -o OUT.tif --toc A.TOC --product N
 //   rhlhost toc A.TOC
 //   rhlhost [--handler PATH] --version
 #include "Batch.h"
@@ -38,10 +38,10 @@ constexpr const char* kUsage =
     "  probe FILE...\n"
     "  info FILE [--text]\n"
     "  dump FILE OUT.raw [--window X0,Y0,X1,Y1]\n"
-    "  render FILE OUT.tif|OUT.png [--window X0,Y0,X1,Y1]\n"
-    "  render [--jobs N] [--format tif|png] [--window X0,Y0,X1,Y1] -o OUTDIR FILE_OR_DIR...\n"
-    "  mosaic -o OUT.tif FILE_OR_DIR...\n"
-    "  mosaic -o OUT.tif --toc A.TOC --product N\n"
+    "  render FILE OUT.tif|OUT.png [--window X0,Y0,X1,Y1] [--no-overviews|--world-file]\n"
+    "  render [--jobs N] [--format tif|png] [--window X0,Y0,X1,Y1] [--no-overviews|--world-file] -o OUTDIR FILE_OR_DIR...\n"
+    "  mosaic [--no-overviews] -o OUT.tif FILE_OR_DIR...\n"
+    "  mosaic [--no-overviews] -o OUT.tif --toc A.TOC --product N\n"
     "  toc A.TOC\n"
     "  --version | --help";
 
@@ -151,9 +151,9 @@ int Info(const Exports& rh, const std::string& path, bool asText)
 }
 
 int RenderOne(const Exports& rh, const std::string& input, const std::string& output, OutputFormat format,
-              const Window& window)
+              const RenderOptions& options)
 {
-    RenderOutcome outcome = RenderFile(rh, input, output, format, window);
+    RenderOutcome outcome = RenderFile(rh, input, output, format, options);
     if (!outcome.warning.empty())
         std::fprintf(stderr, "rhlhost: %s: %s\n", input.c_str(), outcome.warning.c_str());
     if (outcome.status == RenderStatus::Refused)
@@ -168,16 +168,23 @@ int RenderOne(const Exports& rh, const std::string& input, const std::string& ou
 
 int Render(const Exports& rh, const CommandLine& line, bool raw)
 {
-    if (!line.output.empty() && !raw)
+    const RenderOptions options{line.window, line.overviews, line.worldFile};
+    std::string message;
+    if (!line.output.empty() && !raw) {
+        if (!OptionsFitFormat(line.format == "png" ? OutputFormat::Png : OutputFormat::GeoTiff, options, message))
+            return Fail(kExitUsage, message);
         return RunBatch(rh, BatchOptionsFrom(line));
+    }
     if (line.positional.size() != 2)
         return Fail(kExitUsage, kUsage);
     OutputFormat format = OutputFormat::Raw;
     if (!FormatFromName(line.positional[1], format) || (format == OutputFormat::Raw) != raw)
         return Fail(kExitUsage, raw ? "dump writes .raw files" : "render writes .tif, .tiff or .png files");
+    if (!OptionsFitFormat(format, options, message))
+        return Fail(kExitUsage, message);
     if (Missing(line.positional[0]))
         return kExitRefused;
-    return RenderOne(rh, line.positional[0], line.positional[1], format, line.window);
+    return RenderOne(rh, line.positional[0], line.positional[1], format, options);
 }
 
 int Run(const Exports& rh, const std::string& command, const CommandLine& line)
@@ -197,8 +204,9 @@ int Run(const Exports& rh, const std::string& command, const CommandLine& line)
         if (!FormatFromName(line.output, format) || format != OutputFormat::GeoTiff)
             return Fail(kExitUsage, "mosaic writes .tif or .tiff files");
         if (fromToc)
-            return Missing(line.toc) ? kExitRefused : RunTocMosaic(rh, line.toc, line.product, line.output);
-        return RunMosaic(rh, args, line.output);
+            return Missing(line.toc) ? kExitRefused
+                                     : RunTocMosaic(rh, line.toc, line.product, line.output, line.overviews);
+        return RunMosaic(rh, args, line.output, line.overviews);
     }
     return Fail(kExitUsage, kUsage);
 }

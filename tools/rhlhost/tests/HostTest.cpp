@@ -6,6 +6,7 @@
 #include "tests/SampleFiles.h"
 #include "tests/fixtures/Corpus.h"
 #include "tests/fixtures/NitfFileWriter.h"
+#include "tests/fixtures/NitfImageWriter.h"
 #include "tests/fixtures/RpfFrameWriter.h"
 #include "tests/fixtures/TempFiles.h"
 
@@ -73,6 +74,14 @@ std::vector<std::string> HostArgv(std::vector<std::string> args)
 ProcessResult RunHost(const std::vector<std::string>& args)
 {
     return RunProgram(HostArgv(args));
+}
+
+// GDAL's judge of a cloud-optimised GeoTIFF (Debian's python3-gdal), run by the system's Python that has GDAL.
+bool ValidCloudOptimised(const std::string& tiff)
+{
+    return RunProgram({"/usr/bin/python3",
+                       "/usr/lib/python3/dist-packages/osgeo_utils/samples/validate_cloud_optimized_geotiff.py", "-q",
+                       tiff}).exitCode == 0;
 }
 
 // A batch render of every file below `in`, 64 x 64 pixels of each, on two workers.
@@ -185,6 +194,7 @@ const Command kCommands[] = {
     {{"info", "IN/frame.ntf", "--text", "--text"}, 2, {"--text is given twice"}, {}},
     {{"info", "IN/frame.ntf", "--jobs", "2"}, 2, {"--jobs does not apply to info"}, {}},
     {{"render", "IN/frame.ntf", "OUT/frame.tif", "--format", "png"}, 2, {"--format does not apply to render without -o"}, {}},
+    {{"render", "IN/frame.ntf", "OUT/frame.tif", "--world-file"}, 2, {"--world-file goes with PNG output"}, {}},
     {{"mosaic", "-o", "OUT/m.png", "IN"}, 2, {"mosaic writes .tif or .tiff files"}, {}},
     {{"render", "-o", "OUT", "IN/notes.txt"}, 1, {"IN/notes.txt: the handler does not recognise it", "1 files: 0 rendered"}, {}},
     {{"mosaic", "-o", "OUT/m.tif", "IN/utm.ntf"}, 1, {"no frame to place in the mosaic"}, {}},
@@ -313,6 +323,31 @@ TEST(HostBatch, ThousandFramesOnTwoWorkersKeepMemoryFlat)
     EXPECT_LT(peak[1] - peak[0], kFlatKilobytes) << "100 frames: " << peak[0] << " kB, 1000 frames: " << peak[1];
 }
 
+// Rows pass through as they arrive: rendering or dumping an image 16 times
+// as tall (64 MiB) holds no more than a few strips more.
+TEST(HostRender, RowsPassThroughInMemoryOfAFewStrips)
+{
+    constexpr long kFlatKilobytes = 16 * 1024;
+    TempDirectory directory;
+    long peak[2][2] = {};
+    for (int32_t rows : {512, 8192}) {
+        NitfImagePlan plan;
+        plan.rows = rows;
+        plan.columns = 8192;
+        plan.NPPBV = 64;
+        plan.NBPC = rows / 64;
+        const auto value = [](int32_t, int32_t row, int32_t column) { return uint64_t(row * 7 ^ column) % 251; };
+        WriteFile(directory / "in.ntf", BuildImageFile(plan, JoinBlocks(BuildImageBlocks(plan, value))));
+        for (const char* output : {"out.tif", "out.raw"}) {
+            const ProcessResult result = RunHost({output[4] == 't' ? "render" : "dump", directory / "in.ntf", directory / output});
+            ASSERT_EQ(result.exitCode, 0) << result.err;
+            peak[rows == 8192][output[4] == 'r'] = result.peakKilobytes;
+        }
+    }
+    for (int output = 0; output < 2; ++output)
+        EXPECT_LT(peak[1][output] - peak[0][output], kFlatKilobytes) << (output ? "dump: " : "render: ") << peak[0][output] << " kB, then " << peak[1][output];
+}
+
 uint32_t Checksum(const std::string& pixels, uint32_t width, uint32_t height, size_t bands = 1, size_t band = 0)
 {
     return GdalChecksum(reinterpret_cast<const uint8_t*>(pixels.data()) + band, width, height, bands);
@@ -323,6 +358,8 @@ struct Rendering {
     const char* window; // X0,Y0,X1,Y1 or empty
     std::vector<std::string> colours;
     bool nodata; // the masked value 216 is the TIFF's nodata value
+    size_t overviews = 0;
+    const char* tiffOption = "";
 };
 
 void PrintTo(const Rendering& r, std::ostream* out)
@@ -334,8 +371,9 @@ class HostRender : public testing::TestWithParam<Rendering> { };
 
 // A GeoTIFF has the coordinate system and corners that `rhlhost info` reports
 // (the control points' world positions are the outer corners, so GDAL's
-// corners equal them), the pixels `rhlhost dump` delivers and the palette; a
-// PNG shows the palette's colours.
+// corners equal them), the pixels `rhlhost dump` delivers and the palette,
+// in 256 x 256 tiles laid out as GDAL's validator wants, overviews when large;
+// a PNG shows the palette's colours and its world file places it as the GeoTIFF.
 TEST_P(HostRender, GdalReadsWhatInfoAndDumpSay)
 {
     const Rendering& r = GetParam();
@@ -346,6 +384,8 @@ TEST_P(HostRender, GdalReadsWhatInfoAndDumpSay)
         std::vector<std::string> args = {output == png || output == tiff ? "render" : "dump", input, output};
         if (*r.window)
             args.insert(args.end(), {"--window", r.window});
+        if (output == png || (output == tiff && *r.tiffOption))
+            args.push_back(output == png ? "--world-file" : r.tiffOption);
         ASSERT_EQ(RunHost(args).exitCode, 0) << output;
     }
     const HostInfo info = ReadHostInfo(input);
@@ -355,6 +395,12 @@ TEST_P(HostRender, GdalReadsWhatInfoAndDumpSay)
     const uint32_t w = uint32_t(x1 - x0), h = uint32_t(y1 - y0);
     ASSERT_EQ(gdal.width, w);
     ASSERT_EQ(gdal.height, h);
+    EXPECT_EQ(gdal.block, (std::array<uint32_t, 2>{256, 256}));
+    EXPECT_EQ(gdal.overviews, r.overviews);
+    EXPECT_TRUE(ValidCloudOptimised(tiff));
+    const GdalReport shown = ReadWithGdal(png);
+    for (size_t i = 0; i < 6; ++i)
+        EXPECT_NEAR(shown.geoTransform[i], gdal.geoTransform[i], 1e-9 * (1 + std::fabs(gdal.geoTransform[i])));
     EXPECT_EQ(gdal.colourInterpretations, r.colours);
     EXPECT_EQ(gdal.epsg, info.epsg);
     ASSERT_EQ(info.points.size(), info.epsg ? 3u : 0u);
@@ -369,13 +415,13 @@ TEST_P(HostRender, GdalReadsWhatInfoAndDumpSay)
     // The dump's bytes, grey palettes mapped to their greys, sum as GDAL sums
     // the TIFF's bands; the PNG shows palettes as their colours, masked pixels transparent black.
     const bool paletted = r.colours[0] == "Palette";
-    std::string dump = ReadWholeFile(directory / "dump.raw"), shown;
+    std::string dump = ReadWholeFile(directory / "dump.raw"), expanded;
     for (char& value : dump) {
         if (r.colours[0] == "Gray" && !info.palette.empty())
             value = char(info.palette.at(uint8_t(value))[0]);
         const bool masked = r.nodata && uint8_t(value) == kRpfMaskedPixel;
         for (size_t c = 0; paletted && c < 3u + r.nodata; ++c)
-            shown += masked ? '\0' : c == 3 ? '\xff' : char(info.palette.at(uint8_t(value))[c]);
+            expanded += masked ? '\0' : c == 3 ? '\xff' : char(info.palette.at(uint8_t(value))[c]);
     }
     const auto sums = [&](const std::string& pixels, size_t bands) {
         std::vector<uint32_t> sums;
@@ -384,7 +430,7 @@ TEST_P(HostRender, GdalReadsWhatInfoAndDumpSay)
         return sums;
     };
     EXPECT_EQ(gdal.checksums, sums(dump, r.colours.size()));
-    EXPECT_EQ(ReadWithGdal(png).checksums, paletted ? sums(shown, 3u + r.nodata) : gdal.checksums);
+    EXPECT_EQ(shown.checksums, paletted ? sums(expanded, 3u + r.nodata) : gdal.checksums);
     EXPECT_EQ(gdal.hasNodata, r.nodata);
     EXPECT_TRUE(!r.nodata || gdal.nodata == kRpfMaskedPixel);
     for (size_t i = 0; paletted && i < info.palette.size(); ++i)
@@ -394,9 +440,9 @@ TEST_P(HostRender, GdalReadsWhatInfoAndDumpSay)
 const std::vector<std::string> kPalette = {"Palette"}, kGray = {"Gray"}, kRgb = {"Red", "Green", "Blue"};
 
 INSTANTIATE_TEST_SUITE_P(Samples, HostRender,
-                         testing::Values(Rendering{"cadrg_big_endian", "", kPalette, true},
+                         testing::Values(Rendering{"cadrg_big_endian", "", kPalette, true, 3},
                                          Rendering{"cadrg_big_endian", "100,200,400,300", kPalette, true},
-                                         Rendering{"cib", "", kPalette, true},
+                                         Rendering{"cib", "", kPalette, true, 0, "--no-overviews"},
                                          Rendering{"lookup_table", "", kPalette, false},
                                          Rendering{"rgb_row_utm", "", kRgb, false},
                                          Rendering{"rgb_pixel_decimal", "33,5,80,69", kRgb, false},
@@ -506,16 +552,17 @@ TEST(HostMosaic, FramesMeetOnOneGridAsTheirDumpsSay)
         uint32_t width, height;
         double west, north, east, south;
         std::vector<std::string> colours;
+        size_t overviews; // halved down to 256 pixels a side
     } mosaics[] = {
         {{{FrameFile(CornersAt(-100.0, 40.0), RpfProduct::Cadrg, masked), 0, 0},
           {FrameFile(CornersAt(-99.5, 40.0), RpfProduct::Cadrg, masked), side, 0},
           {FrameFile(CornersAt(-100.0, 39.5), RpfProduct::Cadrg, masked), 0, side}},
-         2 * side, 2 * side, -100.0, 40.0, -99.0, 39.0, kPalette},
+         2 * side, 2 * side, -100.0, 40.0, -99.0, 39.0, kPalette, 4},
         {{{SmallFrameFile(CornersAt(-100.0, 40.0)), 0, 0}, {FrameFile(CornersAt(-99.5, 39.5), RpfProduct::Cib), side, side}},
-         2 * side, 2 * side, -100.0, 40.0, -99.0, 39.0, {"Red", "Green", "Blue", "Alpha"}},
+         2 * side, 2 * side, -100.0, 40.0, -99.0, 39.0, {"Red", "Green", "Blue", "Alpha"}, 4},
         {{{SmallFrameFile(CornersAt(179.25, 40.0)), 0, 0}, {SmallFrameFile(CornersAt(179.75, 40.0)), side, 0},
           {SmallFrameFile(CornersAt(180.25, 40.0)), 2 * side, 0}},
-         3 * side, side, 179.25, 40.0, 180.75, 39.5, kPalette}};
+         3 * side, side, 179.25, 40.0, 180.75, 39.5, kPalette, 5}};
     for (const auto& m : mosaics) {
         TempDirectory in, out;
         std::string expected(size_t(m.width) * m.height, char(kRpfMaskedPixel));
@@ -543,6 +590,8 @@ TEST(HostMosaic, FramesMeetOnOneGridAsTheirDumpsSay)
         EXPECT_NEAR(gdal.X(m.width, m.height), m.east, 1e-9);
         EXPECT_NEAR(gdal.Y(m.width, m.height), m.south, 1e-9);
         EXPECT_EQ(gdal.colourInterpretations, m.colours);
+        EXPECT_EQ(gdal.overviews, m.overviews);
+        EXPECT_TRUE(ValidCloudOptimised(out / "m.tif"));
         if (m.colours != kPalette)
             continue;
         EXPECT_TRUE(gdal.hasNodata && gdal.nodata == kRpfMaskedPixel);

@@ -4,6 +4,7 @@
 #include "tests/fixtures/NitfFileWriter.h"
 #include "tests/fixtures/TempFiles.h"
 
+#include <algorithm>
 #include <regex>
 
 std::vector<std::vector<double>> NumbersIn(const std::string& text, const std::string& pattern)
@@ -38,7 +39,14 @@ GdalReport ReadWithGdal(const std::string& path)
     for (const auto& t : NumbersIn(json, "\"geoTransform\":\\s*\\[" + n + "," + n + "," + n + "," + n + "," + n + "," +
                                              n + "\\]"))
         std::copy(t.begin(), t.end(), report.geoTransform.begin());
-    for (const auto& sum : NumbersIn(json, "\"checksum\":\\s*(\\d+)"))
+    const auto block = NumbersIn(json, "\"block\":\\s*\\[\\s*(\\d+),\\s*(\\d+)");
+    if (!block.empty())
+        report.block = {uint32_t(block[0][0]), uint32_t(block[0][1])};
+    // Overviews (objects of a size and a checksum) set apart from the bands' own checksums.
+    const std::regex overviews("\"overviews\":\\s*\\[(\\s*\\{[^{}]*\\}\\s*,?)*\\s*\\]");
+    if (std::regex_search(json, m, overviews))
+        report.overviews = size_t(std::count(m[0].first, m[0].second, '{'));
+    for (const auto& sum : NumbersIn(std::regex_replace(json, overviews, ""), "\"checksum\":\\s*(\\d+)"))
         report.checksums.push_back(uint32_t(sum[0]));
     const std::regex colour("\"colorInterpretation\":\\s*\"(\\w+)\"");
     for (std::sregex_iterator it(json.begin(), json.end(), colour), end; it != end; ++it)

@@ -14,6 +14,8 @@ struct GdalReport {
     int epsg = 0; // of the coordinate system's outermost ID
     std::array<double, 6> geoTransform{};
     std::vector<uint32_t> checksums; // one per band
+    std::array<uint32_t, 2> block{};  // the first band's block size
+    size_t overviews = 0;             // of the first band
     std::vector<std::string> colourInterpretations;
     bool hasNodata = false;
     double nodata = 0;
