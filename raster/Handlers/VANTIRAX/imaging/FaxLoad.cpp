@@ -150,9 +150,8 @@ bool DecodeRows(TIFF* tiff, const LoadRequest& request)
 }
 
 // The strip read a band of rows at a time through libtiff, which reads the
-// strip in pieces when it is not in memory, decodes on from its current row
-// and starts the strip again for a row above it. Rows from one that fails on
-// are never given.
+// strip in pieces when it is not in memory and starts it again when row 0 is
+// asked for after others. Rows from one that fails on are never given.
 class FaxRows : public ROWLOADER {
 public:
     explicit FaxRows(const LOADSOURCE& stream) : ROWLOADER(stream), file{&source, source.Size(), 0} {}
@@ -178,24 +177,39 @@ public:
     {
         if (band->width != width || band->bitsPerPixel != 1 || TIFFScanlineSize64(tiff) != band->bytesPerLine)
             return 0;
-        uint32_t filled = 0;
-        for (; filled < band->height && firstRow + uint64_t(filled) < std::min(height, lastRow); ++filled) {
-            uint8_t* row = band->pixels + size_t(filled) * band->bytesPerLine;
-            if (TIFFReadScanline(tiff, row, firstRow + filled, 0) < 0) {
-                lastRow = firstRow + filled;
-                break;
-            }
-            MakeSetBitsBlack(tiff, row, band->bytesPerLine);
+        // Rows before the band are decoded into its first row: the fax
+        // decoder cannot skip them.
+        if (firstRow < nextRow)
+            nextRow = 0;
+        while (nextRow < firstRow && ReadRow(band->pixels)) {
         }
+        uint32_t filled = 0;
+        while (filled < band->height && nextRow == firstRow + filled &&
+               ReadRow(band->pixels + size_t(filled) * band->bytesPerLine))
+            ++filled;
         return filled;
     }
 
 private:
+    bool ReadRow(uint8_t* row)
+    {
+        if (nextRow >= std::min(height, lastRow))
+            return false;
+        if (TIFFReadScanline(tiff, row, nextRow, 0) < 0) {
+            lastRow = nextRow;
+            return false;
+        }
+        MakeSetBitsBlack(tiff, row, TIFFScanlineSize64(tiff));
+        ++nextRow;
+        return true;
+    }
+
     SplicedTiff file;
     TIFF* tiff = nullptr;
     uint32_t width = 0;
     uint32_t height = 0;
-    uint32_t lastRow = UINT32_MAX;
+    uint32_t nextRow = 0;            // the row libtiff decodes next
+    uint32_t lastRow = UINT32_MAX;   // rows from here on cannot be decoded
 };
 
 }  // namespace

@@ -56,8 +56,9 @@ struct LOADSOURCE {
 };
 
 // A decoder kept open on one stream between loads of its rows; it reads the
-// file a chunk at a time and holds only the rows it is working on.
+// file kRowLoaderChunkBytes at a time and holds only the rows it works on.
 struct ROWLOADER;
+constexpr uint32_t kRowLoaderChunkBytes = 16 * 1024;
 
 // Load flags. The JPEG loads pass kLoadFlagsJpeg, with kLoadFlagRgbStream
 // added when the NITF APP6 segment says the components are coded as R,G,B

@@ -26,7 +26,6 @@ namespace {
 constexpr int kGreyComponents = 1;
 constexpr int kColourComponents = 3;
 constexpr int kWarningLevel = -1;
-constexpr size_t kSourceChunkSize = 64 * 1024; // what a row decoder reads of its stream at once
 const JOCTET kSuppliedEndOfImage[2] = {kMarkerPrefix, kEndOfImage};
 
 struct JpegErrorExit {
@@ -132,7 +131,7 @@ struct ChunkSource {
     jpeg_source_mgr manager;
     SplicedSource* bytes;
     uint64_t position;
-    JOCTET chunk[kSourceChunkSize];
+    JOCTET chunk[kRowLoaderChunkBytes];
 };
 
 void StartSource(j_decompress_ptr decoder)

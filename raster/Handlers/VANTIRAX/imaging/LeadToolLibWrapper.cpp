@@ -24,10 +24,9 @@ constexpr uint32_t kScanChunkSize = 32 * 1024; // one read per chunk: a stream c
 constexpr uint64_t kDecodedRecordBytes = 128;
 // What a row decoder holds besides its band. libjpeg: the rows of its
 // MCU-row buffers (two MCU rows of 16 and the context rows of fancy
-// upsampling) and its read chunk; libtiff: the scanlines it reads ahead and
-// its fax run arrays, 16 bytes a column.
+// upsampling); libtiff: the scanlines it reads ahead and its fax run arrays,
+// 16 bytes a column; and the read chunk of either.
 constexpr uint64_t kJpegDecoderRows = 48;
-constexpr uint64_t kDecoderChunkBytes = 64 * 1024;
 constexpr uint64_t kFaxDecoderRows = 18;
 constexpr uint64_t kFaxRunBytesPerColumn = 16;
 // NITF blocks are at most 8192 pixels a side, unless the image is one block.
@@ -400,6 +399,14 @@ void CLeadToolLibWrapper::Forget(Decoded::iterator entry)
     recent.erase(entry);
 }
 
+// What one block may hold besides its records: an even share of the bound
+// among the blocks of a block row, which a row draws together.
+uint64_t CLeadToolLibWrapper::BlockShare() const
+{
+    const uint64_t share = cacheBound / blocksAcross;
+    return share > kDecodedRecordBytes ? share - kDecodedRecordBytes : 0;
+}
+
 // Gives up the least recently drawn blocks until `bytes` more fit the
 // bound; the block being decoded, the most recent, stays.
 void CLeadToolLibWrapper::MakeRoom(uint64_t bytes)
@@ -469,7 +476,7 @@ void CLeadToolLibWrapper::DecodeJpegBlock(CFileReader& reader, uint32_t block, D
         return;
     uint8_t insert[kDqtSegmentSize + kDhtSegmentSize];
     const uint32_t insertSize = DefaultTables(head.tables, quality(), insert);
-    const uint64_t share = cacheBound / blocksAcross;
+    const uint64_t share = BlockShare();
     const uint64_t rowBytes = RowBytes(head.width, kGreyBits * head.components);
     FILEINFO info = FreshFileInfo();
     if (rowBytes * head.height <= share) {
@@ -481,7 +488,7 @@ void CLeadToolLibWrapper::DecodeJpegBlock(CFileReader& reader, uint32_t block, D
         // A lossless stream is decoded whole only.
         LOADSOURCE source {sizeof(LOADSOURCE), static_cast<int>(reader.handle), stream.offset, stream.length,
                            nullptr, 0, 0};
-        const uint64_t decoderBytes = rowBytes * kJpegDecoderRows + kDecoderChunkBytes;
+        const uint64_t decoderBytes = rowBytes * kJpegDecoderRows + kRowLoaderChunkBytes;
         if (head.frameCode == kLosslessFrame || decoderBytes >= share)
             return;
         if (!StartRowDecoder(source, LoadFlags(), share - decoderBytes, entry, info)) {
@@ -539,7 +546,7 @@ bool CLeadToolLibWrapper::LoadBlock(CFileReader& reader, const StreamPlace& stre
     library.L_GetDefaultLoadFileOption(&options, sizeof options);
     options.maxWidth = blockWidthLimit;
     options.maxHeight = blockHeightLimit;
-    options.maxBytes = cacheBound / blocksAcross;
+    options.maxBytes = BlockShare();
     const int handle = static_cast<int>(reader.handle);
     if (library.L_LoadFileOffset(handle, stream.offset, stream.length, &entry.bitmap, sizeof(BITMAPHANDLE),
                                  kBitsAsStored, kOrderRgb, LoadFlags(), nullptr, nullptr, &options,
@@ -583,8 +590,9 @@ void CLeadToolLibWrapper::DecodeBiLevel(CFileReader& reader, DecodedBlock& entry
 {
     const auto LI = static_cast<uint32_t>(dataEnd - dataStart);
     const uint64_t rowBytes = RowBytes(fillWidth, 1);
+    const uint64_t share = BlockShare();
     FILEINFO info = FreshFileInfo();
-    if (rowBytes * fillHeight <= cacheBound) {
+    if (rowBytes * fillHeight <= share) {
         MakeRoom(rowBytes * fillHeight);
         const uint32_t total = LI + kBiLevelHeaderSize;
         std::unique_ptr<uint8_t[]> file(new (std::nothrow) uint8_t[total]);
@@ -597,18 +605,17 @@ void CLeadToolLibWrapper::DecodeBiLevel(CFileReader& reader, DecodedBlock& entry
         library.L_GetDefaultLoadFileOption(&options, sizeof options);
         options.maxWidth = fillWidth;
         options.maxHeight = fillHeight;
-        options.maxBytes = cacheBound;
+        options.maxBytes = share;
         if (library.L_LoadMemory(file.get(), &entry.bitmap, sizeof(BITMAPHANDLE), kBitsAsStored, kOrderAsStored,
                                  kLoadFlagsBiLevel, nullptr, nullptr, total, &options, &info) != kLoadSucceeded)
             return;
         Count(entry, BitmapBytes(&entry.bitmap));
     } else {
         const uint64_t decoderBytes =
-            uint64_t(fillWidth) * kFaxRunBytesPerColumn + rowBytes * kFaxDecoderRows + kDecoderChunkBytes;
+            uint64_t(fillWidth) * kFaxRunBytesPerColumn + rowBytes * kFaxDecoderRows + kRowLoaderChunkBytes;
         const LOADSOURCE source {sizeof(LOADSOURCE), static_cast<int>(reader.handle), dataStart, LI, tiffHeader,
                                  kBiLevelHeaderSize, 0};
-        if (decoderBytes >= cacheBound ||
-            !StartRowDecoder(source, kLoadFlagsBiLevel, cacheBound - decoderBytes, entry, info))
+        if (decoderBytes >= share || !StartRowDecoder(source, kLoadFlagsBiLevel, share - decoderBytes, entry, info))
             return;
         Count(entry, decoderBytes);
         info.decodedRows = info.height;

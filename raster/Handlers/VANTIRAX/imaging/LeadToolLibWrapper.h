@@ -142,6 +142,7 @@ private:
 
     BlockFill FillOf(const FILEINFO& info) const;
     DecodedBlock* Decode(CFileReader& reader, uint32_t block);
+    uint64_t BlockShare() const;
     void MakeRoom(uint64_t bytes);
     void Count(DecodedBlock& entry, uint64_t bytes);
     void Forget(Decoded::iterator entry);

@@ -77,13 +77,14 @@ TEST(Binding, NeedsBothModulesAndEveryEntryPointAndBindsAgainAfterAReset)
 
 constexpr uint32_t kWidth = 77, kHeight = 23, kStride = (kWidth + 7) / 8; // rows of no whole number of bytes
 
-Bytes PackedPattern()
+Bytes PackedPattern(uint32_t width = kWidth, uint32_t height = kHeight)
 {
-    Bytes packed(size_t(kStride) * kHeight);
-    for (uint32_t y = 0; y < kHeight; ++y)
-        for (uint32_t x = 0; x < kWidth; ++x)
+    const uint32_t stride = (width + 7) / 8;
+    Bytes packed(size_t(stride) * height);
+    for (uint32_t y = 0; y < height; ++y)
+        for (uint32_t x = 0; x < width; ++x)
             if ((x / 5 + y / 3) % 3 == 0 || x == y)
-                packed[y * kStride + x / 8] |= uint8_t(0x80 >> (x % 8));
+                packed[y * stride + x / 8] |= uint8_t(0x80 >> (x % 8));
     return packed;
 }
 
@@ -403,6 +404,62 @@ TEST(JpegDecode, CorruptDataAndDecodersNotPreparedFailCleanly)
     CLeadToolLibWrapper otherDecoder;
     EXPECT_FALSE(otherDecoder.PrepareJpeg(otherFile.reader, kOffset, 0, 8));
     EXPECT_EQ(otherDecoder.kind, kNotPrepared);
+}
+
+// One block larger than the bound, decoded by a row decoder into a band of rows: drawn top down, bottom
+// up and in jumps over a window, its rows are those decoded whole (none where only a whole decode is
+// made), and the bound holds. Bi-level: 1024 x 2048; JPEG: 1024 x 256.
+TEST(RowDecoding, BlocksBeyondTheBoundDrawAsDecodedWholeInAnyOrder)
+{
+    constexpr uint32_t kWide = 1024, kBound = 192 << 10;
+    const auto jpeg = [&](int components, void (*change)(JpegBlockPlan&), uint8_t quality) {
+        JpegBlockPlan plan{kWide, 256, components};
+        change(plan);
+        Bytes stream = EncodeJpegBlock(TestPattern(kWide, 256, components, 9), plan);
+        if (!plan.keepEoi) // cut in its scan
+            stream.resize(stream.size() * 2 / 3), stream.insert(stream.end(), {0xFF, 0xD9});
+        return BuildNitfJpegData({stream}, NitfApp6Plan{1, 1, quality, uint8_t(components == 3 ? 2 : 0)});
+    };
+    struct Case { const char* what; Bytes data; int components; bool byRows; };
+    for (const Case& c : {Case{"bi-level", EncodeT4Strip(PackedPattern(kWide, 2048), kWide, 2048, true), 0, true},
+                          {"grey", jpeg(1, [](JpegBlockPlan&) {}, 0), 1, true},
+                          {"colour, restarts", jpeg(3, [](JpegBlockPlan& p) { p.restartRows = 3; }, 0), 3, true},
+                          {"no tables", jpeg(1, [](JpegBlockPlan& p) { p.keepDqt = p.keepDht = false; }, 2), 1, true},
+                          {"cut short", jpeg(1, [](JpegBlockPlan& p) { p.keepEoi = false; }, 0), 1, true},
+                          {"progressive", jpeg(1, [](JpegBlockPlan& p) { p.progressive = true; }, 0), 1, false},
+                          {"lossless", jpeg(1, [](JpegBlockPlan& p) { p.predictor = 1; }, 0), 1, false}}) {
+        SCOPED_TRACE(c.what);
+        const uint32_t rows = c.components ? 256 : 2048, bytes = c.components ? kWide * c.components : kWide / 8;
+        DataFile file(c.data);
+        CLeadToolLibWrapper whole, byRows;
+        byRows.cacheBound = kBound;
+        for (CLeadToolLibWrapper* decoder : {&whole, &byRows})
+            ASSERT_TRUE(c.components ? decoder->PrepareJpeg(file.reader, kOffset, 0, 8) &&
+                                           decoder->Open(file.reader, kOffset, 1, uint32_t(c.data.size()), 8,
+                                                         uint32_t(c.components), kWide, rows, false, kWide, rows)
+                                     : decoder->PrepareBiLevel() &&
+                                           decoder->Open(file.reader, kOffset, 1, uint32_t(c.data.size()), 1, 1,
+                                                         kWide, rows, false));
+        const auto row = [&](CLeadToolLibWrapper& decoder, uint32_t y, uint32_t first, uint32_t last) {
+            Bytes out(size_t(last - first + 1) * std::max(c.components, 1));
+            return decoder.GetRow(file.reader, 0, y, first, last, bytes, out.data()) ? out : Bytes{};
+        };
+        std::vector<Bytes> expected;
+        for (uint32_t y = 0; y < rows; ++y)
+            expected.push_back(row(whole, y, 0, kWide - 1));
+        EXPECT_FALSE(expected[0].empty());
+        EXPECT_EQ(expected[rows - 1].empty(), std::string(c.what) == "cut short");
+        const uint32_t jumps[] = {rows / 2, 3, rows - 1, 100, 101, 0, rows / 3};
+        for (uint32_t i = 0; i < 2 * rows + 7; ++i) {
+            const uint32_t y = i < rows ? rows - 1 - i : i < 2 * rows ? i - rows : jumps[i - 2 * rows];
+            const size_t pixel = size_t(std::max(c.components, 1)), first = i < 2 * rows ? 0 : 100;
+            const Bytes& all = c.byRows ? expected[y] : Bytes{};
+            ASSERT_EQ(row(byRows, y, uint32_t(first), kWide - 1 - uint32_t(first)),
+                      all.empty() ? all : Bytes(all.begin() + long(first * pixel), all.end() - long(first * pixel)))
+                << "row " << y;
+            ASSERT_LE(byRows.HeldBytes(), kBound);
+        }
+    }
 }
 
 } // namespace
