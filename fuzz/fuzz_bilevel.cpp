@@ -39,9 +39,9 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size)
     std::vector<uint8_t> row(columns);
     const uint32_t drawn = uint32_t(std::min<uint64_t>(rows, kPixelBudget / columns + 1));
     for (uint32_t r = 0; r < drawn; ++r)
-        decoder.GetRow(0, r, 0, columns - 1, (columns + kByteBits - 1) / kByteBits, row.data());
+        decoder.GetRow(reader, 0, r, 0, columns - 1, (columns + kByteBits - 1) / kByteBits, row.data());
     // A span that starts inside a byte.
     if (columns > 3)
-        decoder.GetRow(0, rows - 1, 3, columns - 1, (columns - 3 + kByteBits - 1) / kByteBits, row.data());
+        decoder.GetRow(reader, 0, rows - 1, 3, columns - 1, (columns - 3 + kByteBits - 1) / kByteBits, row.data());
     return 0;
 }

@@ -45,7 +45,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size)
     const uint32_t rows = uint32_t(std::min<uint64_t>(blockHeight, kPixelBudget / blockWidth + 1));
     for (uint32_t block = 0; block < blocks; ++block)
         for (uint32_t r = 0; r < rows; ++r)
-            decoder.GetRow(block, r, 0, blockWidth - 1, blockWidth * bands, row.data());
-    decoder.GetRow(0, 0, blockWidth / 2, blockWidth - 1, (blockWidth - blockWidth / 2) * bands, row.data());
+            decoder.GetRow(reader, block, r, 0, blockWidth - 1, blockWidth * bands, row.data());
+    decoder.GetRow(reader, 0, 0, blockWidth / 2, blockWidth - 1, (blockWidth - blockWidth / 2) * bands, row.data());
     return 0;
 }

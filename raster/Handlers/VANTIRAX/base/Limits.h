@@ -12,9 +12,11 @@ constexpr uint64_t kLargestReaderOffset = 999999999999;
 // Path bytes a reader holds, the terminator included; longer paths are refused.
 constexpr unsigned kReaderPathSize = 260;
 
-// Decoded JPEG and bi-level bitmaps of one image, all its blocks together;
-// a larger image opens and its rows fail.
-constexpr uint64_t kMaxDecodedImageBytes = uint64_t(1) << 30;
+// What one compressed image holds decoded, however large it declares itself:
+// the JPEG blocks and the bi-level bitmap decoded whole, and for those too
+// large to share it with the rest of their block row, an open row decoder
+// and a band of rows each. Least recently drawn blocks make room.
+constexpr uint64_t kMaxDecodedCacheBytes = uint64_t(64) << 20;
 
 // One allocation of libtiff's working memory while it decodes a bi-level
 // strip: its run arrays take 16 bytes per column of the declared width,

@@ -7,7 +7,9 @@
 #include "base/FileCalls.h"
 #include "base/Limits.h"
 
+#include <algorithm>
 #include <cstdlib>
+#include <cstring>
 #include <memory>
 #include <new>
 
@@ -39,6 +41,12 @@ bool IsTiffFile(const uint8_t* data, size_t size)
 {
     return size >= 4 && ((data[0] == 'M' && data[1] == 'M' && data[2] == 0 && data[3] == 42) ||
                          (data[0] == 'I' && data[1] == 'I' && data[2] == 42 && data[3] == 0));
+}
+
+bool StartsWithSoi(SplicedSource& source)
+{
+    uint8_t head[2] = {};
+    return source.Read(0, head, 1) == 1 && source.Read(1, head + 1, 1) == 1 && IsJpegStream(head, sizeof head);
 }
 
 bool ValidRecords(const BITMAPHANDLE* bitmap, uint32_t structSize, const LOADFILEOPTION* options,
@@ -75,7 +83,7 @@ int L_GetDefaultLoadFileOption(LOADFILEOPTION* options, uint32_t structSize)
 {
     if (options == nullptr || structSize != sizeof(LOADFILEOPTION))
         return kLoadFailed;
-    *options = LOADFILEOPTION{structSize, kDefaultMaxSide, kDefaultMaxSide, kMaxDecodedImageBytes};
+    *options = LOADFILEOPTION{structSize, kDefaultMaxSide, kDefaultMaxSide, kMaxDecodedCacheBytes};
     return kLoadSucceeded;
 }
 
@@ -117,4 +125,56 @@ int L_LoadBitmapMemory(const uint8_t* buffer, BITMAPHANDLE* bitmap, uint32_t str
     uint32_t flags = buffer && IsTiffFile(buffer, bufferSize) ? kLoadFlagsBiLevel : kLoadFlagsJpeg;
     return L_LoadMemory(buffer, bitmap, structSize, bitsPerPixel, order, flags, nullptr, nullptr, bufferSize,
                         &options, &info);
+}
+
+SplicedSource::SplicedSource(const LOADSOURCE& source)
+    : handle(static_cast<uint32_t>(source.fileHandle)), offset(source.offset), byteCount(source.byteCount),
+      insertAt(source.insertAt), insert(source.insert, source.insert + source.insertSize)
+{
+}
+
+size_t SplicedSource::Read(uint64_t position, uint8_t* destination, size_t count)
+{
+    const uint64_t insertEnd = insertAt + insert.size();
+    if (position >= Size() || count == 0)
+        return 0;
+    if (position >= insertAt && position < insertEnd) {
+        const size_t taken = size_t(std::min<uint64_t>(count, insertEnd - position));
+        std::memcpy(destination, insert.data() + (position - insertAt), taken);
+        return taken;
+    }
+    const uint64_t fileStart = position < insertAt ? position : position - insert.size();
+    const uint64_t pieceEnd = position < insertAt ? insertAt : byteCount;
+    const auto taken = uint32_t(std::min<uint64_t>({count, pieceEnd - fileStart, UINT32_MAX}));
+    return filecalls::ReadAt(handle, offset + fileStart, destination, taken) ? taken : 0;
+}
+
+// The source must lie within the file and the insert within the stream; a
+// stream starting with SOI goes to the JPEG decoder, any other to the fax one.
+ROWLOADER* L_StartLoadRows(const LOADSOURCE* source, uint32_t flags, const LOADFILEOPTION* options, FILEINFO* info)
+{
+    if (source == nullptr || source->structSize != sizeof(LOADSOURCE) || source->fileHandle <= 0 ||
+        options == nullptr || options->structSize != sizeof(LOADFILEOPTION) || info == nullptr ||
+        info->structSize != sizeof(FILEINFO) || (source->insert == nullptr && source->insertSize != 0) ||
+        source->insertAt > source->byteCount ||
+        !SpanWithin(source->offset, source->byteCount, filecalls::Size(uint32_t(source->fileHandle))))
+        return nullptr;
+    *info = FILEINFO{sizeof(FILEINFO), 0, 0, 0, 0, 0};
+    SplicedSource head(*source);
+    return StartsWithSoi(head) ? StartJpegRows(*source, flags, *options, *info)
+                               : StartFaxRows(*source, *options, *info);
+}
+
+uint32_t L_LoadRows(ROWLOADER* loader, int fileHandle, uint32_t firstRow, BITMAPHANDLE* band)
+{
+    if (loader == nullptr || fileHandle <= 0 || band == nullptr || band->pixels == nullptr)
+        return 0;
+    loader->source.handle = static_cast<uint32_t>(fileHandle);
+    return loader->Load(firstRow, band);
+}
+
+int L_EndLoadRows(ROWLOADER* loader)
+{
+    delete loader;
+    return kLoadSucceeded;
 }

@@ -30,6 +30,9 @@ const ImagingEntry kFileEntries[] = {
     {"L_LoadFileOffset", AsEntry(&L_LoadFileOffset)},
     {"L_LoadBitmapMemory", AsEntry(&L_LoadBitmapMemory)},
     {"L_LoadMemory", AsEntry(&L_LoadMemory)},
+    {"L_StartLoadRows", AsEntry(&L_StartLoadRows)},
+    {"L_LoadRows", AsEntry(&L_LoadRows)},
+    {"L_EndLoadRows", AsEntry(&L_EndLoadRows)},
 };
 
 const ImagingModule kBuiltInModules[] = {
@@ -77,6 +80,9 @@ void BindFile(const ImagingModule* module)
     FindEntry(module, "L_LoadFileOffset", gBinding.L_LoadFileOffset);
     FindEntry(module, "L_LoadBitmapMemory", gBinding.L_LoadBitmapMemory);
     FindEntry(module, "L_LoadMemory", gBinding.L_LoadMemory);
+    FindEntry(module, "L_StartLoadRows", gBinding.L_StartLoadRows);
+    FindEntry(module, "L_LoadRows", gBinding.L_LoadRows);
+    FindEntry(module, "L_EndLoadRows", gBinding.L_EndLoadRows);
 }
 
 bool EveryEntryFound()
@@ -84,7 +90,8 @@ bool EveryEntryFound()
     const ImagingBinding& b = gBinding;
     return b.kernelModule && b.fileModule && b.L_InitBitmap && b.L_AllocateBitmap && b.L_FreeBitmap &&
            b.L_AccessBitmap && b.L_GetBitmapRowCol && b.L_ReleaseBitmap && b.L_GetDefaultLoadFileOption &&
-           b.L_LoadFileOffset && b.L_LoadBitmapMemory && b.L_LoadMemory;
+           b.L_LoadFileOffset && b.L_LoadBitmapMemory && b.L_LoadMemory && b.L_StartLoadRows && b.L_LoadRows &&
+           b.L_EndLoadRows;
 }
 
 }  // namespace

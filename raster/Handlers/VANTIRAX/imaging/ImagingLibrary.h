@@ -1,4 +1,4 @@
-// The process-wide binding to the imaging library: its two modules and ten
+// The process-wide binding to the imaging library: its two modules and thirteen
 // entry points, found by name once and guarded by the one LTGuard.
 #pragma once
 
@@ -61,10 +61,13 @@ struct ImagingBinding {
     L_LoadFileOffsetFunction L_LoadFileOffset;
     L_LoadBitmapMemoryFunction L_LoadBitmapMemory;
     L_LoadMemoryFunction L_LoadMemory;
+    L_StartLoadRowsFunction L_StartLoadRows;
+    L_LoadRowsFunction L_LoadRows;
+    L_EndLoadRowsFunction L_EndLoadRows;
     uint8_t bound;
 };
 
-// True when both modules and all ten entry points are bound. A failed
+// True when both modules and all thirteen entry points are bound. A failed
 // attempt is retried at the next call.
 bool EnsureLibrary();
 // Forgets the modules and entry points (the library is being unloaded).

@@ -1,7 +1,8 @@
 // The records the imaging library exchanges with its callers, and the
-// signatures of its ten entry points. The library is in two modules: the
+// signatures of its thirteen entry points. The library is in two modules: the
 // bitmap kernel (bitmap records and row spans) and the file loader (JPEG
-// streams and TIFF-wrapped CCITT T.4 strips decoded into bitmaps).
+// streams and TIFF-wrapped CCITT T.4 strips decoded into bitmaps, whole or a
+// band of rows at a time).
 #pragma once
 
 #include <cstddef>
@@ -41,6 +42,24 @@ struct FILEINFO {
                                 // than height when the stream's data ran out (the rest is zeros)
 };
 
+// A stream in an open file, byteCount bytes from offset, with insertSize
+// bytes from memory placed before its byte insertAt (a TIFF header before a
+// strip, default tables before a frame header); the loader keeps a copy.
+struct LOADSOURCE {
+    uint32_t structSize;
+    int fileHandle;
+    uint64_t offset;
+    uint64_t byteCount;
+    const uint8_t* insert;      // null when insertSize is 0
+    uint32_t insertSize;
+    uint64_t insertAt;
+};
+
+// A decoder kept open on one stream between loads of its rows; it reads the
+// file kRowLoaderChunkBytes at a time and holds only the rows it works on.
+struct ROWLOADER;
+constexpr uint32_t kRowLoaderChunkBytes = 16 * 1024;
+
 // Load flags. The JPEG loads pass kLoadFlagsJpeg, with kLoadFlagRgbStream
 // added when the NITF APP6 segment says the components are coded as R,G,B
 // (no colour transform); the bi-level load passes kLoadFlagsBiLevel.
@@ -72,3 +91,13 @@ using L_LoadMemoryFunction = int (*)(const uint8_t* buffer, BITMAPHANDLE* bitmap
                                      FILEINFO* info);
 using L_LoadBitmapMemoryFunction = int (*)(const uint8_t* buffer, BITMAPHANDLE* bitmap, uint32_t structSize,
                                            int bitsPerPixel, int order, uint32_t bufferSize);
+// Row loads: start reads the stream's header into info (width, height and
+// bitsPerPixel; decodedRows 0) and returns null on failure. Each load fills
+// the band bitmap (the frame's width and depth, any height) with the rows from
+// firstRow on, decoding on from where the last load stopped or again from the
+// top, reading through fileHandle; it returns the rows filled from the band's
+// top, fewer when the stream's data runs out or breaks.
+using L_StartLoadRowsFunction = ROWLOADER* (*)(const LOADSOURCE* source, uint32_t flags,
+                                               const LOADFILEOPTION* options, FILEINFO* info);
+using L_LoadRowsFunction = uint32_t (*)(ROWLOADER* loader, int fileHandle, uint32_t firstRow, BITMAPHANDLE* band);
+using L_EndLoadRowsFunction = int (*)(ROWLOADER* loader);

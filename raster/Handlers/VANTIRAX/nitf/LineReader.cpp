@@ -1,6 +1,6 @@
 // ReadLine: one row of the image, assembled block by block. Uncompressed rows
 // are read from the file, only the bytes of the span in each band; compressed
-// rows come from the decoder's bitmaps.
+// rows come from the decoder.
 #include "nitf/NitfImage.h"
 
 #include "base/CheckedRead.h"
@@ -56,7 +56,7 @@ bool CNitfImage::ReadLine(CFileReader& reader, uint32_t row, int32_t firstColumn
         const uint32_t c0 = b == firstBlock ? first % blockWidth : 0;
         const uint32_t c1 = b == lastBlock ? last % blockWidth : blockWidth - 1;
         const uint32_t n = c1 - c0 + 1;
-        const bool ok = decoded ? ReadCompressedBlock(b, rowInBlock, c0, c1, out)
+        const bool ok = decoded ? ReadCompressedBlock(reader, b, rowInBlock, c0, c1, out)
                                 : ReadUncompressedBlock(reader, b, rowInBlock, c0, n, out);
         if (!ok)
             return false;
@@ -320,19 +320,19 @@ int32_t CNitfImage::SignificantBits() const
     return ABPP >= 1 && ABPP <= NBPP && PJUST() != 'L' ? ABPP : NBPP;
 }
 
-// A compressed block's span, from the decoder: one bitmap per stored block
+// A compressed block's span, from the decoder: one stream per stored block
 // (a masked block that is not stored gives zeros).
-bool CNitfImage::ReadCompressedBlock(uint32_t block, uint32_t rowInBlock, uint32_t c0, uint32_t c1, uint8_t* out)
+bool CNitfImage::ReadCompressedBlock(CFileReader& reader, uint32_t block, uint32_t rowInBlock, uint32_t c0, uint32_t c1, uint8_t* out)
 {
     const uint32_t n = c1 - c0 + 1;
-    uint32_t bitmap = block;
+    uint32_t stream = block;
     if (!streamIndex.empty()) {
-        bitmap = streamIndex[block];
-        if (bitmap == kBlockNotStored) {
+        stream = streamIndex[block];
+        if (stream == kBlockNotStored) {
             std::memset(out, 0, size_t(n) * OutputPixelBytes());
             return true;
         }
     }
     const uint32_t byteCount = compressionKind == kBiLevel ? (n + kByteBits - 1) / kByteBits : n * OutputPixelBytes();
-    return decoder.GetRow(bitmap, rowInBlock, c0, c1, byteCount, out);
+    return decoder.GetRow(reader, stream, rowInBlock, c0, c1, byteCount, out);
 }

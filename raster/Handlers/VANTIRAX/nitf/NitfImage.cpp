@@ -207,7 +207,7 @@ bool CNitfImage::DataFitsFile() const
 }
 
 // JPEG rows come out one byte per pixel (grey) or three (colour), which is
-// what the row buffer holds; the decoder holds a bitmap per stored block.
+// what the row buffer holds; the decoder decodes one stream per stored block.
 bool CNitfImage::PrepareJpegData(CFileReader& reader, uint64_t dataLength)
 {
     const int64_t bits = int64_t(NBPP) * NBANDS;
@@ -226,7 +226,7 @@ bool CNitfImage::PrepareJpegData(CFileReader& reader, uint64_t dataLength)
 
 // A masked JPEG image stores only some blocks, each its own stream, where
 // the mask table's block records place them: in any order, with any bytes
-// between them. Block b is the decoder's bitmap of its rank among the stored
+// between them. Block b is the decoder's stream of its rank among the stored
 // blocks in block order.
 bool CNitfImage::IndexMaskedStreams()
 {

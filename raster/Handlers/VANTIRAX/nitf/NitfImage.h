@@ -2,7 +2,7 @@
 // image subheader (both the NITF 2.0 and 2.1 layouts), decides whether the
 // image is one this library serves, describes its colours and delivers rows:
 // uncompressed images block by block from the file in any IMODE, compressed
-// ones from the embedded decoder.
+// ones from the embedded decoder, which decodes a block when a row needs it.
 #pragma once
 
 #include "base/FileReader.h"
@@ -104,8 +104,8 @@ public:
     int32_t GetPaletteSize() const;
     bool GetPaletteEntry(int32_t index, uint8_t& red, uint8_t& green, uint8_t& blue) const;
     void AllocLineBuffer();
-    // Decodes a compressed image into the decoder; the decoder's error texts
-    // pass through as exceptions.
+    // Readies the decoder of a compressed image, which decodes blocks as rows
+    // need them; the decoder's error texts pass through as exceptions.
     bool OpenCompressed(CFileReader& reader, uint64_t dataLength);
     // One row, columns firstColumn..lastColumn inclusive, into out: one byte
     // per pixel for one band, three for three bands.
@@ -128,8 +128,8 @@ private:
     uint8_t isPrepared = 0;          // PrepareData accepted the image
     uint64_t readLimit = 0;          // bytes of the file that reads may reach
     uint32_t maskTableLength = 0;    // IMDATOFF: bytes of LI before the blocked data
-    uint32_t storedBlockCount = 0;   // JPEG: streams the decoder holds
-    std::vector<uint32_t> streamIndex; // masked JPEG: decoder bitmap of each block
+    uint32_t storedBlockCount = 0;   // JPEG: streams the decoder decodes
+    std::vector<uint32_t> streamIndex; // masked JPEG: the decoder's stream of each block
     // Strips of rows of the uncompressed blocks being read, one slot per block
     // column (per band and block column in IMODE "B" and "S"), so that a strip
     // costs one file read rather than one per row. Empty when they would take
@@ -186,5 +186,6 @@ private:
     void ScatterBand(const uint8_t* source, uint32_t sourceStride, uint32_t n, int32_t band, uint8_t* out) const;
     uint8_t ConvertPixel(const uint8_t* pixel) const;
     int32_t SignificantBits() const;
-    bool ReadCompressedBlock(uint32_t block, uint32_t rowInBlock, uint32_t c0, uint32_t c1, uint8_t* out);
+    bool ReadCompressedBlock(CFileReader& reader, uint32_t block, uint32_t rowInBlock, uint32_t c0, uint32_t c1,
+                             uint8_t* out);
 };

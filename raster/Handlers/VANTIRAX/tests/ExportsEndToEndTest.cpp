@@ -1,9 +1,11 @@
 // What a host meets through the loaded handler: every kind of file probed,
 // opened and drawn, judged by GDAL; every file of the shared corpus; handles'
-// descriptors and heap; images beyond the decoded-bitmap caps.
+// descriptors and heap; images beyond the decoded-block bound.
 #include "tests/GdalPeer.h"
 #include "tests/SampleFiles.h"
+#include "base/Limits.h"
 #include "tests/fixtures/BiLevelWriter.h"
+#include "tests/fixtures/JpegBlockWriter.h"
 #include "tests/fixtures/Corpus.h"
 #include "tests/fixtures/NitfImageWriter.h"
 #include "tests/fixtures/TempFiles.h"
@@ -224,10 +226,35 @@ TEST(HandleHygiene, TenThousandHandlesLeaveDescriptorsAndHeapFlat)
     EXPECT_LE(HeapInUse(), heapHalfway + kHeapSlack);
 }
 
+// A JPEG image of one 33000 x 33000 block, 1.01 GiB decoded (uniform, and arithmetic coded in a few
+// bytes), opens without decoding and draws its last row from a row decoder, within the bound.
+TEST(MemoryLimits, JpegBlockBeyondAGibibyteDrawsItsLastRowWithinTheBound)
+{
+    constexpr int32_t kSide = 33000;
+    JpegBlockPlan block{kSide, kSide};
+    block.arithmetic = true;
+    const Bytes data = BuildNitfJpegData({EncodeJpegBlock(Bytes(kSide, 90), block)}, {});
+    NitfImagePlan plan;
+    plan.rows = plan.columns = kSide;
+    plan.IC = "C3";
+    plan.COMRAT = "00.0";
+    TempFile file(BuildImageFile(plan, std::string(data.begin(), data.end())), ".ntf");
+    const size_t before = HeapInUse();
+    OpenedImage image(LoadHandler(VX_HANDLER_PATH), file.path());
+    ASSERT_TRUE(image.Ready());
+    EXPECT_LT(HeapInUse(), before + (1u << 20));
+    std::vector<uint8_t> pixels;
+    uint32_t failedRows = 0;
+    ASSERT_TRUE(image.Draw(0, kSide - 1, kSide, kSide, pixels, failedRows));
+    EXPECT_EQ(failedRows, 0u);
+    EXPECT_EQ(pixels, std::vector<uint8_t>(kSide, 90));
+    EXPECT_LT(HeapInUse(), before + kMaxDecodedCacheBytes + (1u << 20));
+}
+
 // White bi-level images beyond the caps open without allocating their declared size and their
 // rows fail while the handle stays good; those within decode. 99,999,999 x 100 one-bit pixels
-// (a one-dimensionally coded strip of 64 columns stands for any width) are 1.16 GiB, above the
-// 1 GiB bitmap cap. A 2 MiB bitmap whose fax decoder run arrays for 17 million columns would take
+// (a one-dimensionally coded strip of 64 columns stands for any width) are 1.16 GiB, whose row
+// decoder's run arrays alone would take 1.6 GB, above the decoded-block bound. A 2 MiB bitmap whose fax decoder run arrays for 17 million columns would take
 // 272 MB: such strips of a few kilobytes made it allocate over a gibibyte. A million columns decode.
 TEST(MemoryLimits, BiLevelImagesBeyondTheCapsOpenSmallAndFailTheirRows)
 {

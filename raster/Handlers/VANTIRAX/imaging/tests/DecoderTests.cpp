@@ -77,13 +77,14 @@ TEST(Binding, NeedsBothModulesAndEveryEntryPointAndBindsAgainAfterAReset)
 
 constexpr uint32_t kWidth = 77, kHeight = 23, kStride = (kWidth + 7) / 8; // rows of no whole number of bytes
 
-Bytes PackedPattern()
+Bytes PackedPattern(uint32_t width = kWidth, uint32_t height = kHeight)
 {
-    Bytes packed(size_t(kStride) * kHeight);
-    for (uint32_t y = 0; y < kHeight; ++y)
-        for (uint32_t x = 0; x < kWidth; ++x)
+    const uint32_t stride = (width + 7) / 8;
+    Bytes packed(size_t(stride) * height);
+    for (uint32_t y = 0; y < height; ++y)
+        for (uint32_t x = 0; x < width; ++x)
             if ((x / 5 + y / 3) % 3 == 0 || x == y)
-                packed[y * kStride + x / 8] |= uint8_t(0x80 >> (x % 8));
+                packed[y * stride + x / 8] |= uint8_t(0x80 >> (x % 8));
     return packed;
 }
 
@@ -102,14 +103,14 @@ TEST(BiLevelDecode, OneAndTwoDimensionalStripsDecodeBitForBit)
         for (uint32_t y = 0; y < kHeight; ++y) {
             // Columns 3 to 76, a span that starts inside a byte; a set bit is black (0).
             Bytes row(kWidth - 3 + 1, 0x11);
-            ASSERT_TRUE(decoder.GetRow(0, y, 3, kWidth - 1, (kWidth - 3 + 7) / 8, row.data()));
+            ASSERT_TRUE(decoder.GetRow(file.reader, 0, y, 3, kWidth - 1, (kWidth - 3 + 7) / 8, row.data()));
             for (uint32_t x = 3; x < kWidth; ++x)
                 ASSERT_EQ(row[x - 3], (packed[y * kStride + x / 8] & (0x80 >> (x % 8))) ? 0 : 255)
                     << x << "," << y << " 2-D " << twoDimensional;
             ASSERT_EQ(row.back(), 0x11) << "wrote past the span";
         }
         Bytes row(kWidth);
-        EXPECT_FALSE(decoder.GetRow(1, 0, 0, kWidth - 1, kStride, row.data())); // block 1 of a strip of one
+        EXPECT_FALSE(decoder.GetRow(file.reader, 1, 0, 0, kWidth - 1, kStride, row.data())); // block 1 of a strip of one
     }
 }
 
@@ -126,7 +127,7 @@ TEST(BiLevelDecode, CorruptOrShortStripsFailCleanly)
         CLeadToolLibWrapper decoder;
         ASSERT_TRUE(decoder.PrepareBiLevel());
         decoder.Open(file.reader, kOffset, 1, uint32_t(data.size()), 1, 1, kWidth, kHeight, false);
-        decoder.GetRow(0, kHeight - 1, 0, kWidth - 1, kStride, row.data());
+        decoder.GetRow(file.reader, 0, kHeight - 1, 0, kWidth - 1, kStride, row.data());
     }
     DataFile file(strip);
     CLeadToolLibWrapper decoder;
@@ -135,7 +136,7 @@ TEST(BiLevelDecode, CorruptOrShortStripsFailCleanly)
     EXPECT_FALSE(decoder.Open(file.reader, kOffset, 1, LI + 1, 1, 1, kWidth, kHeight, false));
     decoder.FreeBitmaps();
     EXPECT_FALSE(decoder.Open(file.reader, kOffset, 1, LI, 1, 1, kWidth, LI * 8 + 8, false));
-    EXPECT_EQ(decoder.bitmaps, nullptr);
+    EXPECT_EQ(decoder.HeldBytes(), 0u);
 }
 
 // The stream with one byte set, at an offset from the first marker of the given code.
@@ -166,14 +167,14 @@ struct OpenedJpeg {
     Bytes Row(uint32_t block, uint32_t row, uint32_t first = 0, uint32_t last = kSide - 1)
     {
         Bytes pixels(last - first + 1);
-        return decoder.GetRow(block, row, first, last, uint32_t(pixels.size()), pixels.data()) ? pixels : Bytes{};
+        return decoder.GetRow(file.reader, block, row, first, last, uint32_t(pixels.size()), pixels.data()) ? pixels : Bytes{};
     }
     // Every row of a block, as GetRow delivers them.
     Bytes Block(uint32_t block, uint32_t bands = 1)
     {
         Bytes pixels(kSide * kSide * bands);
         for (uint32_t row = 0; row < kSide; ++row)
-            EXPECT_TRUE(decoder.GetRow(block, row, 0, kSide - 1, kSide * bands, pixels.data() + row * kSide * bands));
+            EXPECT_TRUE(decoder.GetRow(file.reader, block, row, 0, kSide - 1, kSide * bands, pixels.data() + row * kSide * bands));
         return pixels;
     }
 };
@@ -185,7 +186,7 @@ TEST(JpegDecode, StreamsDecodeAsTheirReference)
         Bytes stream, expected;
         int components = 1;
         uint8_t quality = 0, streamColor = 0;
-        bool opens = true;
+        bool draws = true;
     };
     std::vector<Case> cases;
     for (bool rgbCoding : {false, true}) {
@@ -230,9 +231,9 @@ TEST(JpegDecode, StreamsDecodeAsTheirReference)
             cases.push_back({what + " quality 3", stream, DecodeJpegBlock(complete, 1), 1, 3});
             cases.push_back({what + " no quality", stream, DecodeJpegBlock(complete, 1), 1, 0, 0, keepDqt});
         }
-    // Refused: a frame larger than the block, 65535 x 65535 declared in a small stream, lossless
+    // No rows: a frame larger than the block, 65535 x 65535 declared in a small stream, lossless
     // streams cut in half or of 12-bit samples; 32000 x 32000 declared over a few bytes of data
-    // (C3 and C5) stop where the data ends.
+    // (C3 decoded by rows stops where the data ends, C5 beyond the bound is not decoded).
     JpegBlockPlan large, lossless;
     large.width = large.height = 2 * kSide;
     lossless.predictor = 1;
@@ -261,10 +262,12 @@ TEST(JpegDecode, StreamsDecodeAsTheirReference)
         getrusage(RUSAGE_SELF, &before);
         OpenedJpeg image(BuildNitfJpegData({c.stream}, NitfApp6Plan{1, 1, c.quality, c.streamColor}), 1,
                          uint32_t(c.components), false, c.what.find("32000") == std::string::npos ? kSide : 32000);
+        Bytes first(3 * kSide);
+        ASSERT_EQ(image.opened && image.decoder.GetRow(image.file.reader, 0, 0, 0, kSide - 1, 3 * kSide, first.data()),
+                  c.draws);
         getrusage(RUSAGE_SELF, &after);
         EXPECT_LT(after.ru_minflt - before.ru_minflt, mostPagesTouched);
-        ASSERT_EQ(image.opened, c.opens);
-        if (c.opens) {
+        if (c.draws) {
             EXPECT_EQ(image.Block(0, uint32_t(c.components)), c.expected);
             EXPECT_EQ(image.decoder.loaderConverted, c.components == 3 ? 1 : 0);
         }
@@ -308,13 +311,13 @@ TEST(JpegDecode, BlocksGiveRowsOnlyFromFramesThatFillThem)
         // Columns 10 to 15 of row 5: six bytes asked, the rest untouched; more asked: only what is there.
         Bytes span(40, 0xEE);
         for (uint32_t asked : {6u, 40u}) {
-            ASSERT_TRUE(image.decoder.GetRow(0, 5, 10, 15, asked, span.data()));
+            ASSERT_TRUE(image.decoder.GetRow(image.file.reader, 0, 5, 10, 15, asked, span.data()));
             EXPECT_EQ(Bytes(span.begin(), span.begin() + 6), Bytes(&wholeDecoded[90], &wholeDecoded[96]));
             EXPECT_EQ(span[6], 0xEE);
         }
-        EXPECT_FALSE(image.decoder.GetRow(2, 0, 0, kSide - 1, kSide, span.data()));
-        EXPECT_FALSE(image.decoder.GetRow(0, kSide, 0, 0, 1, span.data()));
-        EXPECT_FALSE(image.decoder.GetRow(0, 0, kSide, kSide, 1, span.data()));
+        EXPECT_FALSE(image.decoder.GetRow(image.file.reader, 2, 0, 0, kSide - 1, kSide, span.data()));
+        EXPECT_FALSE(image.decoder.GetRow(image.file.reader, 0, kSide, 0, 0, 1, span.data()));
+        EXPECT_FALSE(image.decoder.GetRow(image.file.reader, 0, 0, kSide, kSide, 1, span.data()));
     }
 }
 
@@ -344,27 +347,33 @@ TEST(JpegDecode, StreamCutShortGivesOnlyTheRowsBeforeTheCut)
     EXPECT_EQ(rowsGiven, (std::set<uint32_t>{0, 8}));
 }
 
-TEST(JpegDecode, LastBlockWithoutEndOfImageIsDamaged)
+// Streams are found as their rows are asked for: a block without EOI fails its rows, and without a
+// mask table so does every block after it, while those before it draw. Only a first stream that breaks
+// before its scan is damaged data at open. A second Open without FreeBitmaps is refused.
+TEST(JpegDecode, DamagedStreamsFailTheirOwnRows)
 {
     JpegBlockPlan open;
     open.keepEoi = false;
-    const Bytes pattern = TestPattern(kSide, kSide, 1, 1);
-    const Bytes data = BuildNitfJpegData({EncodeJpegBlock(pattern, {}), EncodeJpegBlock(pattern, open)}, {});
-    DataFile file(data);
-    CLeadToolLibWrapper decoder;
-    ASSERT_TRUE(decoder.PrepareJpeg(file.reader, kOffset, 0, 8));
-    try {
-        decoder.Open(file.reader, kOffset, 2, uint32_t(data.size()), 8, 1, 32, 16, false);
-        FAIL() << "no exception";
-    } catch (const std::runtime_error& error) {
-        EXPECT_STREQ(error.what(), kDamagedImageText);
+    const Bytes pattern = TestPattern(kSide, kSide, 1, 1), good = EncodeJpegBlock(pattern, {});
+    const Bytes data = BuildNitfJpegData({good, EncodeJpegBlock(pattern, open), good}, {});
+    for (size_t size : {data.size(), size_t(100)}) {
+        DataFile file(Bytes(data.begin(), data.begin() + long(size)));
+        CLeadToolLibWrapper decoder;
+        ASSERT_TRUE(decoder.PrepareJpeg(file.reader, kOffset, 0, 8));
+        try {
+            EXPECT_TRUE(decoder.Open(file.reader, kOffset, 3, uint32_t(size), 8, 1, 48, 16, false));
+            EXPECT_EQ(size, data.size()) << "no exception";
+        } catch (const std::runtime_error& error) {
+            EXPECT_STREQ(error.what(), kDamagedImageText);
+            continue;
+        }
+        Bytes row(kSide);
+        for (uint32_t block : {2, 0, 1})
+            EXPECT_EQ(decoder.GetRow(file.reader, block, 0, 0, kSide - 1, kSide, row.data()), block == 0) << block;
+        EXPECT_THROW(decoder.Open(file.reader, kOffset, 3, 0, 8, 1, 48, 16, false), std::runtime_error);
+        decoder.FreeBitmaps();
+        EXPECT_FALSE(decoder.GetRow(file.reader, 0, 0, 0, kSide - 1, kSide, row.data()));
     }
-    // The first block stays decoded; a second Open without FreeBitmaps is refused.
-    Bytes row(kSide);
-    EXPECT_TRUE(decoder.GetRow(0, 0, 0, kSide - 1, kSide, row.data()));
-    EXPECT_THROW(decoder.Open(file.reader, kOffset, 2, 0, 8, 1, 32, 16, false), std::runtime_error);
-    decoder.FreeBitmaps();
-    EXPECT_FALSE(decoder.GetRow(0, 0, 0, kSide - 1, kSide, row.data()));
 }
 
 TEST(JpegDecode, CorruptDataAndDecodersNotPreparedFailCleanly)
@@ -389,12 +398,68 @@ TEST(JpegDecode, CorruptDataAndDecodersNotPreparedFailCleanly)
     EXPECT_FALSE(decoder.Open(file.reader, kOffset, 1, 0, 12, 1, kSide, kSide, false));
     ASSERT_TRUE(huge.PrepareJpeg(file.reader, kOffset, 0, 8));
     EXPECT_FALSE(huge.Open(file.reader, kOffset, 0xFFFFFFFF, 0, 8, 1, kSide, kSide, false));
-    EXPECT_EQ(huge.bitmaps, nullptr);
+    EXPECT_EQ(huge.HeldBytes(), 0u);
     data[2 + 4] = 'X'; // identifier "XITF"
     DataFile otherFile(data);
     CLeadToolLibWrapper otherDecoder;
     EXPECT_FALSE(otherDecoder.PrepareJpeg(otherFile.reader, kOffset, 0, 8));
     EXPECT_EQ(otherDecoder.kind, kNotPrepared);
+}
+
+// One block larger than the bound, decoded by a row decoder into a band of rows: drawn top down, bottom
+// up and in jumps over a window, its rows are those decoded whole (none where only a whole decode is
+// made), and the bound holds. Bi-level: 1024 x 2048; JPEG: 1024 x 256.
+TEST(RowDecoding, BlocksBeyondTheBoundDrawAsDecodedWholeInAnyOrder)
+{
+    constexpr uint32_t kWide = 1024, kBound = 192 << 10;
+    const auto jpeg = [&](int components, void (*change)(JpegBlockPlan&), uint8_t quality) {
+        JpegBlockPlan plan{kWide, 256, components};
+        change(plan);
+        Bytes stream = EncodeJpegBlock(TestPattern(kWide, 256, components, 9), plan);
+        if (!plan.keepEoi) // cut in its scan
+            stream.resize(stream.size() * 2 / 3), stream.insert(stream.end(), {0xFF, 0xD9});
+        return BuildNitfJpegData({stream}, NitfApp6Plan{1, 1, quality, uint8_t(components == 3 ? 2 : 0)});
+    };
+    struct Case { const char* what; Bytes data; int components; bool byRows; };
+    for (const Case& c : {Case{"bi-level", EncodeT4Strip(PackedPattern(kWide, 2048), kWide, 2048, true), 0, true},
+                          {"grey", jpeg(1, [](JpegBlockPlan&) {}, 0), 1, true},
+                          {"colour, restarts", jpeg(3, [](JpegBlockPlan& p) { p.restartRows = 3; }, 0), 3, true},
+                          {"no tables", jpeg(1, [](JpegBlockPlan& p) { p.keepDqt = p.keepDht = false; }, 2), 1, true},
+                          {"cut short", jpeg(1, [](JpegBlockPlan& p) { p.keepEoi = false; }, 0), 1, true},
+                          {"progressive", jpeg(1, [](JpegBlockPlan& p) { p.progressive = true; }, 0), 1, false},
+                          {"lossless", jpeg(1, [](JpegBlockPlan& p) { p.predictor = 1; }, 0), 1, false}}) {
+        SCOPED_TRACE(c.what);
+        const uint32_t rows = c.components ? 256 : 2048, bytes = c.components ? kWide * c.components : kWide / 8;
+        DataFile file(c.data);
+        CLeadToolLibWrapper whole, byRows;
+        byRows.cacheBound = kBound;
+        for (CLeadToolLibWrapper* decoder : {&whole, &byRows})
+            ASSERT_TRUE(c.components ? decoder->PrepareJpeg(file.reader, kOffset, 0, 8) &&
+                                           decoder->Open(file.reader, kOffset, 1, uint32_t(c.data.size()), 8,
+                                                         uint32_t(c.components), kWide, rows, false, kWide, rows)
+                                     : decoder->PrepareBiLevel() &&
+                                           decoder->Open(file.reader, kOffset, 1, uint32_t(c.data.size()), 1, 1,
+                                                         kWide, rows, false));
+        const auto row = [&](CLeadToolLibWrapper& decoder, uint32_t y, uint32_t first, uint32_t last) {
+            Bytes out(size_t(last - first + 1) * std::max(c.components, 1));
+            return decoder.GetRow(file.reader, 0, y, first, last, bytes, out.data()) ? out : Bytes{};
+        };
+        std::vector<Bytes> expected;
+        for (uint32_t y = 0; y < rows; ++y)
+            expected.push_back(row(whole, y, 0, kWide - 1));
+        EXPECT_FALSE(expected[0].empty());
+        EXPECT_EQ(expected[rows - 1].empty(), std::string(c.what) == "cut short");
+        const uint32_t jumps[] = {rows / 2, 3, rows - 1, 100, 101, 0, rows / 3};
+        for (uint32_t i = 0; i < 2 * rows + 7; ++i) {
+            const uint32_t y = i < rows ? rows - 1 - i : i < 2 * rows ? i - rows : jumps[i - 2 * rows];
+            const size_t pixel = size_t(std::max(c.components, 1)), first = i < 2 * rows ? 0 : 100;
+            const Bytes& all = c.byRows ? expected[y] : Bytes{};
+            ASSERT_EQ(row(byRows, y, uint32_t(first), kWide - 1 - uint32_t(first)),
+                      all.empty() ? all : Bytes(all.begin() + long(first * pixel), all.end() - long(first * pixel)))
+                << "row " << y;
+            ASSERT_LE(byRows.HeldBytes(), kBound);
+        }
+    }
 }
 
 } // namespace

@@ -366,10 +366,15 @@ int32_t WorstDifference(LoadedImage& loaded)
     if (gdal.size() < plane * size_t(image.NBANDS))
         return kNoOracle;
     int32_t worst = 0;
-    for (size_t row = 0; row < size_t(image.NROWS); ++row) {
+    // Drawn bottom up, then top down; a window of each row must be the row's own bytes.
+    for (size_t drawn = 0; drawn < 2 * size_t(image.NROWS); ++drawn) {
+        const size_t row = drawn < size_t(image.NROWS) ? size_t(image.NROWS) - 1 - drawn : drawn - size_t(image.NROWS);
         const std::vector<uint8_t> ours = loaded.Row(uint32_t(row));
         if (ours.empty())
             return kRowFailed;
+        const int32_t first = image.NCOLS / 3, last = image.NCOLS - 1 - first;
+        EXPECT_EQ(loaded.Row(uint32_t(row), first, last),
+                  std::vector<uint8_t>(ours.begin() + first * long(bands), ours.begin() + (last + 1) * long(bands)));
         for (size_t i = 0; i < columns * bands; ++i) { // i: column x bands + band
             const size_t band = image.drawnBandCount == int32_t(bands) ? size_t(image.drawnBands[i % bands]) : i % bands;
             uint32_t expected = gdal[band * plane + row * columns + i / bands];
