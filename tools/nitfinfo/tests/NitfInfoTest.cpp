@@ -131,7 +131,7 @@ TEST(NitfInfo, ExitCodesMessagesAndUntrustedText)
         {"", 2, -1, "", "usage: nitfinfo"},
         {"--bogus " + good, 2, -1, "", "unknown option --bogus"},
         {folder / "missing.ntf " + good, 1, 1, "FTITLE      fixture", "missing.ntf: no such file\n"},
-        {folder.path() + " " + text, 1, 2, "", "a directory, not a file\nnitfinfo: " + text + ": not a NITF"},
+        {folder.path() + " " + text, 1, 2, "", "not a regular file\nnitfinfo: " + text + ": not a NITF"},
         {odd, 0, 0, "FTITLE      ?\"\\???e\n", ""},
         {"--json " + odd + " " + text + " " + good, 1, 1, R"("FTITLE": "?\"\\???e", "FSCLAS": "U")", "text.ntf: not"},
     };
