@@ -4,13 +4,12 @@
 #include "base/FileReader.h"
 #include "nitf/NitfFileHeader.h"
 #include "nitf/NitfImage.h"
-#include "plugin/FormatProbe.h"
+#include "plugin/RasterHandler.h"
 #include "rpf/RpfHeaderSection.h"
 
 #include <cctype>
 #include <cstring>
 #include <filesystem>
-#include <system_error>
 
 namespace {
 
@@ -64,6 +63,8 @@ bool IsUncompressedCode(const char IC[2])
     return IC[0] == 'N' && (IC[1] == 'C' || IC[1] == 'M');
 }
 
+} // namespace
+
 InfoFields ImageFields(const CNitfImage& image)
 {
     InfoFields fields;
@@ -89,6 +90,8 @@ InfoFields ImageFields(const CNitfImage& image)
     fields.push_back(tags);
     return fields;
 }
+
+namespace {
 
 // Every image segment's subheader, found after the segments before it (LISH + LI each).
 void DescribeImages(const CNitfFileHeader& header, FileInfo& info)
@@ -170,20 +173,13 @@ InfoFields FrameNameFields(const std::string& fileName)
 
 bool DescribeFile(const std::string& path, FileInfo& info, std::string& reason)
 {
-    std::error_code error;
-    const auto status = std::filesystem::status(path, error);
-    if (!std::filesystem::exists(status)) {
-        reason = "no such file";
-        return false;
-    }
-    if (std::filesystem::is_directory(status)) {
-        reason = "a directory, not a file";
-        return false;
-    }
+    // Served: RH_Open's steps would open the file and serve it.
+    const Refusal refusal = WhyRefused(path.c_str());
     CNitfFileHeader header;
     header.SetPath(path.c_str());
-    if (!header.Parse()) {
-        reason = "not a NITF 2.0, 2.1 or NSIF 1.0 file (its file header is refused)";
+    // A file missing, not a regular file or without a NITF file header is not described.
+    if (refusal == Refusal::kNoSuchFile || refusal == Refusal::kNotRegularFile || !header.Parse()) {
+        reason = RefusalText(refusal, header);
         return false;
     }
     info.path = path;
@@ -191,7 +187,9 @@ bool DescribeFile(const std::string& path, FileInfo& info, std::string& reason)
     const char FSCLAS = header.FSCLAS();
     info.header.push_back(Field("FSCLAS", &FSCLAS, 1));
     info.header.push_back(Number("NUMI", header.NUMI));
-    info.header.push_back(Flag("served", ProbeFormat(path.c_str())));
+    info.header.push_back(Flag("served", refusal == Refusal::kNone));
+    if (refusal != Refusal::kNone)
+        info.header.push_back(Text("reason", RefusalText(refusal, header)));
     if (header.HasRpfHeader())
         DescribeRpfFrame(header, info);
     DescribeImages(header, info);

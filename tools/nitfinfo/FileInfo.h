@@ -1,7 +1,9 @@
 // What nitfinfo reports of one file: the NITF file header, the RPF frame
 // name and the image subheaders as the library's parsers keep them, and
-// whether the handler's format probe accepts the file.
+// whether the handler would open and serve the file, or why not.
 #pragma once
+
+#include "base/Refusal.h"
 
 #include <string>
 #include <vector>
@@ -19,7 +21,7 @@ using InfoFields = std::vector<InfoField>;
 
 struct FileInfo {
     std::string path;
-    InfoFields header;              // FHDR, FTITLE, FSCLAS, NUMI, served
+    InfoFields header;              // FHDR, FTITLE, FSCLAS, NUMI, served, reason when not served
     InfoFields rpf;                 // empty unless the file header holds RPFHDR
     std::vector<InfoFields> images; // one per image segment
 };
@@ -27,6 +29,12 @@ struct FileInfo {
 // Fills info for the file at path. False with a one-line reason when it is
 // missing, a folder, unreadable or no NITF file.
 bool DescribeFile(const std::string& path, FileInfo& info, std::string& reason);
+class CNitfFileHeader;
+class CNitfImage;
+// The reported fields of a parsed image subheader.
+InfoFields ImageFields(const CNitfImage& image);
+// Why the handler does not serve the file of header, in words naming the first image's fields.
+std::string RefusalText(Refusal why, const CNitfFileHeader& header);
 // The field's bytes as printable text: others replaced by '?', trailing blanks cut.
 std::string PrintableText(const char* field, size_t width);
 // Names of the tagged record extensions (CETAG) in UDID or IXSHD data, up to the first malformed one.

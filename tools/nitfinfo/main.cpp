@@ -15,11 +15,11 @@ constexpr int kExitBadArguments = 2;
 constexpr char kUsage[] =
     "usage: nitfinfo [--json] FILE...\n"
     "  Prints each file's NITF version, FTITLE, FSCLAS and image segment count, whether the handler\n"
-    "  serves it, the series, zone and producer of an RPF frame's name, and for every image segment\n"
-    "  IID1, IDATIM, ICAT, ISORCE, IC, COMRAT, IREP, IMODE, NBPP, ABPP, PVTYPE, NROWS, NCOLS, NPPBH,\n"
-    "  NPPBV, NBPR, NBPC, NBANDS, ICORDS, IGEOLO and the tags of its extensions.\n"
+    "  serves it and why not, the series, zone and producer of an RPF frame's name, and for every\n"
+    "  image segment IID1, IDATIM, ICAT, ISORCE, IC, COMRAT, IREP, IMODE, NBPP, ABPP, PVTYPE, NROWS,\n"
+    "  NCOLS, NPPBH, NPPBV, NBPR, NBPC, NBANDS, ICORDS, IGEOLO and the tags of its extensions.\n"
     "  --json   one JSON array with an object per file, for scripts\n"
-    "  Exit codes: 0 every file reported; 1 a file missing, a folder or not NITF (reported on stderr);\n"
+    "  Exit codes: 0 every file reported; 1 a file missing, not a regular file or not NITF (why, on stderr);\n"
     "  2 bad arguments.\n";
 
 } // namespace

@@ -61,7 +61,7 @@ private:
                 return Vanished(file);
             if (!file.named)
                 return {FileResult::NotRecognised, 0};
-            progress_.Report(file.path + ": the handler does not recognise it");
+            progress_.Report(file.path + ": the handler does not recognise it (nitfinfo says why)");
             return {FileResult::NamedNotRecognised, 0};
         }
         const fs::path output = fs::path(options_.outputDirectory) / (name + options_.extension);

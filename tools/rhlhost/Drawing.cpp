@@ -36,10 +36,17 @@ OpenFile::~OpenFile()
     rh_.close(handle_.bytes);
 }
 
+std::string OpenRefusalWords(const OpenedImage& image)
+{
+    // Result 1 with a failed status: a file of the handler's format whose kind it does not serve.
+    const char* words = image.result == 1 ? "recognised but not served" : "not a file this handler reads";
+    return "(result " + std::to_string(image.result) + ", status " + std::to_string(image.status) + "): " + words +
+           "; nitfinfo says why";
+}
+
 std::string OpenFile::RefusalReason() const
 {
-    return "the handler could not open it (result " + std::to_string(image.result) + ", status " +
-           std::to_string(image.status) + ")";
+    return "the handler could not open it " + OpenRefusalWords(image);
 }
 
 WindowDraw::~WindowDraw()

@@ -18,6 +18,10 @@ struct Window {
 // "X0,Y0,X1,Y1" with X1 > X0 >= 0 and Y1 > Y0 >= 0.
 bool ParseWindow(const char* text, Window& window);
 
+// What RH_Open's result and status say in words, and where to learn why:
+// "(result 1, status 5): recognised but not served; nitfinfo says why".
+std::string OpenRefusalWords(const OpenedImage& image);
+
 // An open image, closed again when this object goes away.
 class OpenFile {
 public:

@@ -1,5 +1,6 @@
 #include "Info.h"
 
+#include "Drawing.h"
 #include "GeoTransform.h"
 
 #include <cstdio>
@@ -124,7 +125,7 @@ void PrintInfoText(const std::string& path, const OpenedImage& image)
 {
     std::printf("file        %s\n", path.c_str());
     if (image.result != 1 || image.status != 0) {
-        std::printf("opened      no (result %d, status %u)\n", image.result, image.status);
+        std::printf("opened      no %s\n", OpenRefusalWords(image).c_str());
         return;
     }
     std::printf("size        %u x %u pixels\n", image.width, image.height);

@@ -5,6 +5,7 @@
 #include "tests/fixtures/Command.h"
 #include "tests/fixtures/Corpus.h"
 #include "tests/fixtures/NitfFileWriter.h"
+#include "tests/fixtures/NitfImageWriter.h"
 #include "tests/fixtures/TempFiles.h"
 
 #include <gtest/gtest.h>
@@ -125,14 +126,22 @@ TEST(NitfInfo, ExitCodesMessagesAndUntrustedText)
     WriteFile(text, std::string(400, 'x'));
     std::string bytes = SampleBytes("mono_geographic");
     WriteFile(odd, bytes.replace(39, 6, "\x01\"\\\t\x7f\xff")); // FTITLE "fixture" begins with these
+    const std::string aridpcm = folder / "c2.ntf", real = folder / "real.ntf"; // described, not served
+    NitfImagePlan plan;
+    plan.IC = "C2", plan.COMRAT = "00.0";
+    WriteFile(aridpcm, BuildImageFile(plan, "x"));
+    plan = NitfImagePlan{}, plan.PVTYPE = "R", plan.NBPP = 32;
+    WriteFile(real, BuildImageFile(plan, "1234"));
     // errLines: one per refused file; -1 for the usage.
     const struct { std::string arguments; int exitCode; long errLines; std::string inOut, inErr; } cases[] = {
         {"--help", 0, 0, "usage: nitfinfo", ""},
         {"", 2, -1, "", "usage: nitfinfo"},
         {"--bogus " + good, 2, -1, "", "unknown option --bogus"},
         {folder / "missing.ntf " + good, 1, 1, "FTITLE      fixture", "missing.ntf: no such file\n"},
-        {folder.path() + " " + text, 1, 2, "", "a directory, not a file\nnitfinfo: " + text + ": not a NITF"},
+        {folder.path() + " " + text, 1, 2, "", "not a regular file\nnitfinfo: " + text + ": not a NITF"},
         {odd, 0, 0, "FTITLE      ?\"\\???e\n", ""},
+        {real, 0, 0, "served      no\n  reason      pixel type PVTYPE R is not served\n", ""},
+        {"--json " + aridpcm, 0, 0, R"("served": false, "reason": "compression IC C2 (ARIDPCM) is not served")", ""},
         {"--json " + odd + " " + text + " " + good, 1, 1, R"("FTITLE": "?\"\\???e", "FSCLAS": "U")", "text.ntf: not"},
     };
     for (const auto& row : cases) {

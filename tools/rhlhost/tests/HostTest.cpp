@@ -181,7 +181,7 @@ const Command kCommands[] = {
     {{"render", "--format", "png", "-o", "OUT", "IN/gone.ntf", "IN/utm.ntf"}, 1,
      {"IN/gone.ntf: the file no longer exists", "2 files: 1 rendered"}, {"utm.ntf.png"}},
     {{"render", "--jobs", "2", "-o", "OUT", "IN"}, 1,
-     {"IN/broken.ntf: the handler could not open it (result 0, status 5)",
+     {"IN/broken.ntf: the handler could not open it (result 0, status 5): not a file this handler reads; nitfinfo",
       "IN/rows_fail.ntf: 32 rows could not be decoded (written as zeros)",
       "308 files: 5 rendered (1 with 32 undecodable rows), 303 refused (302 not recognised, 1 not opened, 0 vanished), "
       "0 failed to write"},
@@ -196,7 +196,8 @@ const Command kCommands[] = {
     {{"render", "IN/frame.ntf", "OUT/frame.tif", "--format", "png"}, 2, {"--format does not apply to render without -o"}, {}},
     {{"render", "IN/frame.ntf", "OUT/frame.tif", "--world-file"}, 2, {"--world-file goes with PNG output"}, {}},
     {{"mosaic", "-o", "OUT/m.png", "IN"}, 2, {"mosaic writes .tif or .tiff files"}, {}},
-    {{"render", "-o", "OUT", "IN/notes.txt"}, 1, {"IN/notes.txt: the handler does not recognise it", "1 files: 0 rendered"}, {}},
+    {{"render", "-o", "OUT", "IN/notes.txt"}, 1,
+     {"IN/notes.txt: the handler does not recognise it (nitfinfo says why)", "1 files: 0 rendered"}, {}},
     {{"mosaic", "-o", "OUT/m.tif", "IN/utm.ntf"}, 1, {"no frame to place in the mosaic"}, {}},
     {{"--version"}, 0, {"\nhandler VANTIRAX.rhl version 3, CADRG, CIB and NITF Format Handler"}, {}},
     {{"dump", "IN/frame.ntf", "OUT/frame.tif"}, 2, {"dump writes .raw files"}, {}},

@@ -90,6 +90,7 @@ void CNitfImage::ClearParsed()
     FreeVector(UDID);
     FreeVector(IXSHD);
     NCOLS = NROWS = 0;
+    refusal = Refusal::kNone;
 }
 
 void CNitfImage::Release()
@@ -106,18 +107,25 @@ bool CNitfImage::ReadSubheader(CFileReader& reader, uint32_t offset)
     try {
         ClearParsed();
         FileCursor cursor(reader, reader.FileSize());
-        return ReadFront(cursor, offset) && ReadCorners(cursor) && ReadCompression(cursor) && ReadBands(cursor) &&
-               ReadBlocking(cursor) && ReadExtensions(cursor) && PlaceData(cursor, offset) &&
-               (!isMasked || ReadMaskTable(cursor));
+        if (!ReadFront(cursor, offset) || !ReadCorners(cursor))
+            return Refuse(refusal, Refusal::kSubheaderInvalid);
+        // IC is read before its kind is known: an unknown code fails it.
+        if (!ReadCompression(cursor))
+            return Refuse(refusal, compressionKind < 0 ? Refusal::kUnservedCompression : Refusal::kSubheaderInvalid);
+        if (!ReadBands(cursor))
+            return Refuse(refusal, Refusal::kBandsInvalid);
+        if (!ReadBlocking(cursor) || !ReadExtensions(cursor) || !PlaceData(cursor, offset))
+            return Refuse(refusal, Refusal::kSubheaderInvalid);
+        return Check(!isMasked || ReadMaskTable(cursor), refusal, Refusal::kMaskTableInvalid);
     } catch (...) {
-        return false;
+        return Refuse(refusal, Refusal::kUnexpected);
     }
 }
 
 bool CNitfImage::ReadSubheader(CFileReader& reader, const CNitfFileHeader& header)
 {
     if (header.NUMI < 1 || header.imageSegments == nullptr)
-        return false;
+        return Refuse(refusal, Refusal::kNoImage);
     version21 = header.version21;
     subheaderLength = header.imageSegments[0].subheaderLength;
     return ReadSubheader(reader, header.HL);

@@ -105,26 +105,25 @@ void CNitfFileHeader::SetPath(const char* filePath)
 
 bool CNitfFileHeader::Parse()
 {
+    refusal = Refusal::kNone;
     try {
-        if (path.empty())
-            return false;
         CFileReader reader(0);
         reader.OpenFile(path.c_str(), kShareDenyWrite);
-        if (!reader.HoldsFile())
-            return false;
+        if (path.empty() || !reader.HoldsFile())
+            return Refuse(refusal, Refusal::kUnreadable);
         uint64_t fileSize = reader.FileSize();
         FileCursor cursor(reader, fileSize);
 
         // The whole front is read at once: a file shorter than it has no FL anyway.
         if (!cursor.Read(headerText, sizeof headerText))
-            return false;
+            return Refuse(refusal, Refusal::kNotNitf);
         // NSIF 1.0 is laid out as NITF 2.1.
         if (VersionIs(headerText, "NITF02.10") || VersionIs(headerText, "NSIF01.00"))
             version21 = 1;
         else if (VersionIs(headerText, "NITF02.00"))
             version21 = 0;
         else
-            return false;
+            return Refuse(refusal, Refusal::kNotNitf);
 
         // FL sits at 342 unless a NITF 2.0 FSDEVT moved it to 382; a file whose
         // FL matches its size at neither place was truncated or is not NITF.
@@ -132,7 +131,7 @@ bool CNitfFileHeader::Parse()
             fixedLayout = 1;
         } else {
             if (!FileLengthMatchesAt(cursor, kShiftedLengthOffset, fileSize, lengthText, HL))
-                return false;
+                return Refuse(refusal, Refusal::kFileLengthMismatch);
             fixedLayout = 0;
         }
         FL = fileSize;
@@ -143,20 +142,20 @@ bool CNitfFileHeader::Parse()
             !ReadSegmentGroup(cursor, {4, 5}, NUMT, textSegments) ||
             !ReadSegmentGroup(cursor, {4, 9}, NUMDES, desSegments) ||
             !ReadSegmentGroup(cursor, {4, 7}, NUMRES, resSegments))
-            return false;
+            return Refuse(refusal, Refusal::kHeaderFieldInvalid);
 
         userHeaderOffset = static_cast<uint32_t>(cursor.Position()) + kDataLengthWidth;
         if (!ReadHeaderData(cursor, UDHDL, UDHOFL, UDHD))
-            return false;
+            return Refuse(refusal, Refusal::kHeaderFieldInvalid);
         if (UDHDL == 0)
             userHeaderOffset = kNoUserHeader;
         if (!ReadHeaderData(cursor, XHDL, XHDLOFL, XHD))
-            return false;
+            return Refuse(refusal, Refusal::kHeaderFieldInvalid);
 
         // HL is where the first image subheader begins: not inside this header, not past the file.
-        return HL >= cursor.Position() && HL <= fileSize;
+        return Check(HL >= cursor.Position() && HL <= fileSize, refusal, Refusal::kHeaderFieldInvalid);
     } catch (...) {
-        return false;
+        return Refuse(refusal, Refusal::kUnexpected);
     }
 }
 

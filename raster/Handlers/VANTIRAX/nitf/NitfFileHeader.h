@@ -3,6 +3,8 @@
 // data (the RPFHDR extension of RPF frames) it carries.
 #pragma once
 
+#include "base/Refusal.h"
+
 #include <cstdint>
 #include <string>
 
@@ -41,6 +43,7 @@ public:
     uint32_t userHeaderOffset = 0;      // file offset of UDHOFL; kNoUserHeader when UDHDL is 0
     uint16_t fixedLayout = 0;           // 1: FL at offset 342; 0: at 382 (NITF 2.0 with FSDEVT)
     uint16_t version21 = 0;             // 1 in NITF 2.1 and NSIF 1.0
+    Refusal refusal = Refusal::kNone;   // why Parse failed
 
     CNitfFileHeader() = default;
     ~CNitfFileHeader() { Release(); }

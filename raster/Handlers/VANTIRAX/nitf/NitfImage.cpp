@@ -95,14 +95,16 @@ bool CNitfImage::GetPaletteEntry(int32_t index, uint8_t& red, uint8_t& green, ui
 bool CNitfImage::PrepareData(CFileReader& reader, uint64_t dataLength)
 {
     isPrepared = 0;
+    refusal = Refusal::kNone;
     FreeVector(streamIndex);
     readLimit = ReachableBytes(reader.FileSize());
     if (!ValidGeometry())
-        return false;
+        return Refuse(refusal, Refusal::kBlockGeometryInvalid);
     bool served = false;
     switch (compressionKind) {
     case kUncompressed:
-        served = ServesUncompressed() && DataFitsFile();
+        refusal = UncompressedRefusal();
+        served = refusal == Refusal::kNone && Check(DataFitsFile(), refusal, Refusal::kDataOutsideFile);
         break;
     case kBiLevel:
         // The decoder wraps all LI bytes at once; one byte per pixel comes out.
@@ -120,10 +122,14 @@ bool CNitfImage::PrepareData(CFileReader& reader, uint64_t dataLength)
         served = NBANDS == 1 && IsPaletted();
         break;
     default:
+        refusal = Refusal::kUnservedCompression;
         break;
     }
+    // A compressed kind whose preparation refused it records no cause of its own.
+    if (!served && refusal == Refusal::kNone)
+        refusal = Refusal::kCompressedDataInvalid;
     // The host reads rows by the pixel kind that IsPaletted chooses.
-    served = served && OutputPixelBytes() == HostPixelBytes();
+    served = served && Check(OutputPixelBytes() == HostPixelBytes(), refusal, Refusal::kUnservedRepresentation);
     isPrepared = served ? 1 : 0;
     return served;
 }
@@ -155,19 +161,20 @@ bool CNitfImage::ValidGeometry()
 // Real and complex pixels would show only their sign and exponent bits.
 // 1-bit pixels are palette indices; wider ones are reduced to 8 bits, except
 // through an RGB/LUT table. Packed pixels of several bands are read only
-// where each band's block stands alone (IMODE "B" and "S").
-bool CNitfImage::ServesUncompressed() const
+// where each band's block stands alone (IMODE "B" and "S"). kNone: served.
+Refusal CNitfImage::UncompressedRefusal() const
 {
     const char PVTYPE = subheaderText[kPvtypePosition];
     if (PVTYPE == 'R' || PVTYPE == 'C')
-        return false;
+        return Refusal::kUnservedPixelType;
     if (IsPacked() && NBANDS > 1 && IMODE() != 'B' && IMODE() != 'S')
-        return false;
-    if (IsRgbLut())
-        return NBANDS == 1 && (NBPP == 1 || NBPP == 8);
-    if (!isMono && !isMulti && !(isRgb && drawnBandCount == int32_t(kRgbTables)))
-        return false;
-    return NBPP == 1 ? drawnBandCount == 1 : IsReducedDepth(NBPP);
+        return Refusal::kUnservedDepth;
+    if (IsRgbLut() ? NBANDS != 1 : !isMono && !isMulti && !(isRgb && drawnBandCount == int32_t(kRgbTables)))
+        return Refusal::kUnservedRepresentation;
+    const bool served = IsRgbLut()    ? NBPP == 1 || NBPP == 8
+                        : NBPP == 1 ? drawnBandCount == 1
+                                    : IsReducedDepth(NBPP);
+    return served ? Refusal::kNone : Refusal::kUnservedDepth;
 }
 
 // NBPP 1 and 12: pixels that do not fill whole bytes.

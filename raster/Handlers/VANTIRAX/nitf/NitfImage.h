@@ -6,6 +6,7 @@
 #pragma once
 
 #include "base/FileReader.h"
+#include "base/Refusal.h"
 #include "base/SlotCache.h"
 #include "imaging/Jpeg2000Image.h"
 #include "imaging/LeadToolLibWrapper.h"
@@ -81,6 +82,7 @@ public:
     int32_t IXSHDL = 0, IXSOFL = 0;
     std::vector<uint8_t> IXSHD;
     int32_t NCOLS = 0, NROWS = 0;
+    Refusal refusal = Refusal::kNone; // why ReadSubheader or PrepareData failed
 
     CNitfImage() = default;
     CNitfImage(const CNitfImage&) = delete;
@@ -157,7 +159,7 @@ private:
 
     // Data steps.
     bool ValidGeometry();
-    bool ServesUncompressed() const;
+    Refusal UncompressedRefusal() const;
     bool IsRgbLut() const;
     bool IsPacked() const;
     bool OneBitIndices() const;

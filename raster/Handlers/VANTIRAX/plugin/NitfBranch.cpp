@@ -50,11 +50,14 @@ RHPalette* ImagePalette(const CNitfImage& image)
 
 int32_t CRasterHandler::NitfOpen(RHHandle* handle, CFileReader& reader, const CNitfFileHeader& header)
 {
-    if (!nitfImage.ReadSubheader(reader, header))
+    if (!nitfImage.ReadSubheader(reader, header)) {
+        refusal = nitfImage.refusal;
         throw kCodeSubheader;
+    }
     const NitfSegmentLength& segment = header.imageSegments[0];
     // A kind this library does not serve: the open answers 1, the status 5 says it failed.
     if (!nitfImage.PrepareData(reader, segment.dataLength)) {
+        refusal = nitfImage.refusal;
         lastError = static_cast<int32_t>(kCodePrepare);
         return 1;
     }

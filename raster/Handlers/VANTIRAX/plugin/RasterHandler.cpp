@@ -48,11 +48,12 @@ bool CRasterHandler::ReadHeader(CNitfFileHeader& header)
         header.SetPath(path.c_str());
         if (!header.Parse())
             throw kCodeHeaderParse;
-        if (header.NUMI < 1)
+        if (!Check(header.NUMI >= 1, header.refusal, Refusal::kNoImage))
             throw kCodeNoImage;
         mode = header.HasRpfHeader() ? kModeRpfFrame : kModeNitfImage;
         return true;
     } catch (...) {
+        refusal = header.refusal;
         mode = kModeNone;
         header.Release();
         return false;

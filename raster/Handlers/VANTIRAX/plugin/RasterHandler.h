@@ -6,6 +6,7 @@
 
 #include "nitf/NitfImage.h"
 #include "base/FileReader.h"
+#include "base/Refusal.h"
 #include "plugin/HostRecords.h"
 #include "rpf/RpfFrameReader.h"
 
@@ -38,6 +39,7 @@ public:
     CFileReader fileReader;
     int32_t lastError = 0;
     uint32_t mode = kModeNone;
+    Refusal refusal = Refusal::kNone; // why OpenImage refused the file
 
     explicit CRasterHandler(const char* filePath);
     ~CRasterHandler();
@@ -76,3 +78,7 @@ private:
 
 // Releases the palette and georeference record the open attached to a handle.
 void ReleaseHandleRecords(RHHandle* handle);
+
+// Why RH_Open would not serve the file at path (kNone: it would), found by
+// the same open steps, without the exports. For the library's tools.
+Refusal WhyRefused(const char* path);

@@ -43,8 +43,10 @@ bool FillPalette(RpfColorGraySection& colors, uint8_t* entries)
 int32_t CRasterHandler::RpfOpen(RHHandle* handle, CFileReader& reader, const CNitfFileHeader& header)
 {
     if (header.userHeaderOffset == kNoUserHeader ||
-        !rpfReader.Open(reader, uint64_t(header.userHeaderOffset) + kRpfHeaderDataOffset))
+        !rpfReader.Open(reader, uint64_t(header.userHeaderOffset) + kRpfHeaderDataOffset)) {
+        refusal = rpfReader.refusal;
         return 0;
+    }
     handle->width = kRpfFrameSize;
     handle->height = kRpfFrameSize;
     RpfColorGraySection& colors = rpfReader.colorGraySection;
@@ -64,7 +66,8 @@ int32_t CRasterHandler::RpfOpen(RHHandle* handle, CFileReader& reader, const CNi
         return 0;
     if (paletted) {
         handle->palette = CreatePalette(kRpfPaletteEntries);
-        if (handle->palette == nullptr || !FillPalette(colors, handle->palette->entries))
+        if (handle->palette == nullptr ||
+            !Check(FillPalette(colors, handle->palette->entries), refusal, Refusal::kRpfSectionInvalid))
             return 0;
     }
     handle->status = kStatusOk;

@@ -2,18 +2,29 @@
 
 #include <algorithm>
 #include <cstring>
+#include <iterator>
 
 namespace {
 constexpr uint32_t kCommonKernelWidth = 4; // CADRG and CIB kernels are 4 x 4
-}
+// The components every frame's sections are read from.
+constexpr uint16_t kNeededComponents[] = {kCoverageSectionSubheader,     kCompressionSectionSubheader,
+                                          kCompressionLookupSubsection,  kColorGraySectionSubheader,
+                                          kColormapSubsection,           kImageDescriptionSubheader,
+                                          kImageDisplayParametersSubheader};
+} // namespace
 
 bool CRpfFrameReader::Open(CFileReader& reader, uint64_t headerSectionOffset)
 {
+    refusal = Refusal::kRpfSectionInvalid;
     if (!headerSection.ReadHeaderSection(reader, headerSectionOffset))
         return false;
     bool bigEndian = headerSection.bigEndian;
-    if (!locationSection.ReadLocationSection(reader, headerSection.locationSectionLocation, bigEndian) ||
-        !coverage.ReadCoverage(reader, FindComponentLocation(kCoverageSectionSubheader), bigEndian))
+    if (!locationSection.ReadLocationSection(reader, headerSection.locationSectionLocation, bigEndian))
+        return false;
+    // A section whose component is not listed is read from offset 0 and fails there.
+    if (!ListsNeededComponents())
+        refusal = Refusal::kRpfSectionMissing;
+    if (!coverage.ReadCoverage(reader, FindComponentLocation(kCoverageSectionSubheader), bigEndian))
         return false;
     if (!compressionSection.ReadCompressionSection(reader, FindComponentLocation(kCompressionSectionSubheader),
                                                    FindComponentLocation(kCompressionLookupSubsection),
@@ -24,10 +35,19 @@ bool CRpfFrameReader::Open(CFileReader& reader, uint64_t headerSectionOffset)
                                                FindComponentLocation(kColormapSubsection),
                                                FindComponentLocation(kColorConverterSubsection), bigEndian))
         return false;
-    return imageSection.ReadImageSection(reader, FindComponentLocation(kImageDescriptionSubheader),
-                                         FindComponentLocation(kMaskSubsection),
-                                         FindComponentLocation(kImageDisplayParametersSubheader),
-                                         FindComponentLocation(kSpatialDataSubsection), bigEndian);
+    if (!imageSection.ReadImageSection(reader, FindComponentLocation(kImageDescriptionSubheader),
+                                       FindComponentLocation(kMaskSubsection),
+                                       FindComponentLocation(kImageDisplayParametersSubheader),
+                                       FindComponentLocation(kSpatialDataSubsection), bigEndian))
+        return false;
+    refusal = Refusal::kNone;
+    return true;
+}
+
+bool CRpfFrameReader::ListsNeededComponents() const
+{
+    return std::all_of(std::begin(kNeededComponents), std::end(kNeededComponents),
+                       [this](uint16_t id) { return FindComponentLocation(id) != 0; });
 }
 
 uint32_t CRpfFrameReader::FindComponentLocation(uint16_t componentId) const

@@ -4,6 +4,7 @@
 #pragma once
 
 #include "base/FileReader.h"
+#include "base/Refusal.h"
 #include "rpf/RpfColorGraySection.h"
 #include "rpf/RpfCompressionSection.h"
 #include "rpf/RpfCoverage.h"
@@ -27,6 +28,7 @@ public:
     RpfCompressionSection compressionSection;
     RpfColorGraySection colorGraySection;
     RpfImageSection imageSection;
+    Refusal refusal = Refusal::kNone; // why Open failed
 
     // Reads the frame whose RPF header section (the RPFHDR TRE data) starts
     // at headerSectionOffset. True when every section was read and accepted.
@@ -52,5 +54,6 @@ private:
 
     bool FetchCodes(CFileReader& reader, uint32_t imageRow, uint32_t firstColumn, uint32_t lastColumn);
     bool AssembleLine(uint32_t imageRow, uint32_t firstColumn, uint32_t lastColumn, uint8_t* output);
+    bool ListsNeededComponents() const;
     bool AssembleFromTable(const RpfValueTable& table, uint32_t firstOffset, uint32_t span, uint8_t* output);
 };

@@ -163,37 +163,44 @@ TEST(Image, RowAndPaletteOfWideSamplesAndLookupTables)
 }
 
 // Subheaders the file cannot back, and layouts the reader cannot address safely: refused by the parse
-// (stage 0) or when the data is prepared (stage 1); stage 2: prepared.
+// (stage 0) or when the data is prepared (stage 1), each for its reason; stage 2: prepared.
 TEST(Image, RefusesWhatTheFileCannotBackAndWhatIsNotServed)
 {
     const std::vector<std::string> blocks = BuildImageBlocks(BlockedRgb('B'), Ramp);
     const std::string data = JoinBlocks(blocks);
     using Change = std::function<void(NitfImagePlan&)>;
+    using R = Refusal;
     struct Case {
         const char* what;
         int stage;
+        Refusal why;
         Change change = nullptr;
         std::string data = "", find = "", replace = ""; // data "": the blocks as written; find replaced in the file
         size_t cut = 0;                                 // bytes cut from the end of the file
     };
     for (const Case& c : std::vector<Case>{
-             {"as written", 2},
-             {"cut in the subheader", 0, {}, "", "", "", data.size() + 100},
-             {"XBANDS 99999", 0, [](NitfImagePlan& p) { p.extendedBandCount = true; }, "", "NC000003", "NC099999"},
-             {"NBANDS 0 in NITF 2.0, which has no XBANDS", 0,
+             {"as written", 2, R::kNone},
+             {"cut in the subheader", 0, R::kSubheaderInvalid, {}, "", "", "", data.size() + 100},
+             {"XBANDS 99999", 0, R::kBandsInvalid, [](NitfImagePlan& p) { p.extendedBandCount = true; }, "",
+              "NC000003", "NC099999"},
+             {"IC C9", 0, R::kUnservedCompression, [](NitfImagePlan& p) { p.IC = "C9"; }},
+             {"IC C2", 1, R::kUnservedCompression, [](NitfImagePlan& p) { p.IC = "C2"; }},
+             {"NBPP 7", 1, R::kUnservedDepth, [](NitfImagePlan& p) { p.NBPP = 7; }},
+             {"IREP NODISPLY", 1, R::kUnservedRepresentation, [](NitfImagePlan& p) { p.IREP = "NODISPLY"; }},
+             {"NBANDS 0 in NITF 2.0, which has no XBANDS", 0, R::kBandsInvalid,
               [](NitfImagePlan& p) { p.extendedBandCount = true; p.version21 = false; }},
-             {"a lookup table longer than the rest of the file", 0,
+             {"a lookup table longer than the rest of the file", 0, R::kBandsInvalid,
               [](NitfImagePlan& p) { p.IREP = "RGB/LUT"; p.bands = {{"LU", 3, 4, RgbLookupTables(4)}}; }, "", "300004",
               "399999"},
-             {"short final block", 1, {}, data.substr(0, data.size() - 1)},
-             {"0 wide, two blocks a row", 1, [](NitfImagePlan& p) { p.NPPBH = 0; }},
-             {"9999 x 9999 blocks", 1, [](NitfImagePlan& p) { p.NBPR = p.NBPC = 9999; }},
-             {"blocks not covering the image", 1, [](NitfImagePlan& p) { p.NBPR = 1; }},
-             {"IMODE X", 1, [](NitfImagePlan& p) { p.IMODE = 'X'; }},
-             {"floating point", 1,
+             {"short final block", 1, R::kDataOutsideFile, {}, data.substr(0, data.size() - 1)},
+             {"0 wide, two blocks a row", 1, R::kBlockGeometryInvalid, [](NitfImagePlan& p) { p.NPPBH = 0; }},
+             {"9999 x 9999 blocks", 1, R::kDataOutsideFile, [](NitfImagePlan& p) { p.NBPR = p.NBPC = 9999; }},
+             {"blocks not covering the image", 1, R::kBlockGeometryInvalid, [](NitfImagePlan& p) { p.NBPR = 1; }},
+             {"IMODE X", 1, R::kBlockGeometryInvalid, [](NitfImagePlan& p) { p.IMODE = 'X'; }},
+             {"floating point", 1, R::kUnservedPixelType,
               [](NitfImagePlan& p) { p.PVTYPE = "R"; p.IREP = "MONO"; p.NBPP = 32; p.bands.resize(1); },
               std::string(7 * 5 * 4, '\0')},
-             {"a mask table of more records than the file holds", 0,
+             {"a mask table of more records than the file holds", 0, R::kMaskTableInvalid,
               [](NitfImagePlan& p) { p.IC = "NM"; p.NBPR = p.NBPC = 999; },
               BuildMaskedData(blocks, std::vector<bool>(4, true))}}) {
         NitfImagePlan plan = BlockedRgb('B');
@@ -203,10 +210,14 @@ TEST(Image, RefusesWhatTheFileCannotBackAndWhatIsNotServed)
         std::string bytes = BuildImageFile(plan, stored);
         const size_t at = bytes.find(c.find);
         ASSERT_NE(at, std::string::npos) << c.what;
-        LoadedImage loaded(bytes.replace(at, c.find.size(), c.replace).substr(0, bytes.size() - c.cut));
+        std::string file = bytes.replace(at, c.find.size(), c.replace).substr(0, bytes.size() - c.cut);
+        char FL[13]; // the file header keeps matching the cut file: the image is what it refuses
+        std::snprintf(FL, sizeof FL, "%012zu", file.size());
+        LoadedImage loaded(file.replace(342, 12, FL));
         const bool parsed = loaded.Parse();
         EXPECT_EQ(!parsed ? 0 : loaded.image.PrepareData(loaded.reader, uint32_t(stored.size())) ? 2 : 1, c.stage)
             << c.what;
+        EXPECT_EQ(loaded.image.refusal, c.why) << c.what;
     }
 }
 

@@ -101,15 +101,21 @@ TEST(NitfFileHeader, RefusesWrongVersionsAndLengthsThatLie)
                               Tre("ABCDEF", "x"), xhdl < 0 ? "" : "x", udhdl, xhdl});
     };
     const std::string good = declaring(-1, -1), rest = good.substr(9);
+    const Refusal kVersion = Refusal::kNotNitf, kLength = Refusal::kFileLengthMismatch,
+                  kField = Refusal::kHeaderFieldInvalid;
     // Other versions; FL larger or smaller than the file; a segment count running past the end
     // of the file whose FL still matches, or not a number; UDHDL of 1 or 2 (a negative data
     // size) or past the end of the file; XHDL 2.
-    for (const std::string& bad : {"NITF02.01" + rest, "NITF01.10" + rest, "NSIF01.01" + rest, "NITF03.00" + rest,
-                                   good.substr(0, good.size() - 1), good + "x", std::string(), std::string("NITF02.10"),
-                                   good.substr(0, 360) + "999" + good.substr(363),
-                                   good.substr(0, 360) + "-1x" + good.substr(363), declaring(1, -1), declaring(2, -1),
-                                   declaring(99999, -1), declaring(-1, 2)})
-        EXPECT_FALSE(Parses(bad)) << bad.substr(0, 9) << " " << bad.size();
+    for (const auto& [bad, why] : std::initializer_list<std::pair<std::string, Refusal>>{
+             {"NITF02.01" + rest, kVersion}, {"NITF01.10" + rest, kVersion}, {"NSIF01.01" + rest, kVersion},
+             {"NITF03.00" + rest, kVersion}, {good.substr(0, good.size() - 1), kLength}, {good + "x", kLength},
+             {"", kVersion}, {"NITF02.10", kVersion}, {good.substr(0, 360) + "999" + good.substr(363), kField},
+             {good.substr(0, 360) + "-1x" + good.substr(363), kField}, {declaring(1, -1), kField},
+             {declaring(2, -1), kField}, {declaring(99999, -1), kField}, {declaring(-1, 2), kField}}) {
+        CNitfFileHeader header;
+        EXPECT_FALSE(Parses(bad, &header)) << bad.substr(0, 9) << " " << bad.size();
+        EXPECT_EQ(header.refusal, why) << bad.substr(0, 9) << " " << bad.size();
+    }
 }
 
 } // namespace

@@ -68,7 +68,7 @@ TEST(RpfBadInput, RefusedAtOpenOrOnlyTheLinesTheDamageMeets)
     const std::vector<uint8_t> expected = ExpectedRpfPixels(plan);
     const uint32_t fileSize = uint32_t(frame.bytes.size());
     struct Line { uint32_t row, first, last; bool decodes; }; // decodes as the undamaged frame
-    struct Case { const char* what; std::vector<Edit> edits; bool opens; std::vector<Line> lines = {};
+    struct Case { const char* what; std::vector<Edit> edits; Refusal why; std::vector<Line> lines = {};
                   std::function<void(OpenedFrame&)> alsoCheck = nullptr; size_t cutTo = 0; };
     const auto Bits = [](double value) { uint64_t bits = 0; std::memcpy(&bits, &value, 8); return bits; };
     const auto Lookup = [](uint32_t table, uint32_t field) { return 6 + table * 14 + field; }; // after the header
@@ -79,61 +79,62 @@ TEST(RpfBadInput, RefusedAtOpenOrOnlyTheLinesTheDamageMeets)
     for (uint32_t table = 0; table < 4; ++table)
         sharing.insert(sharing.end(), {{lookup, Lookup(table, 2), 60000, 4}, {lookup, Lookup(table, 10), 62, 4}});
     const RpfFrameLayout& at = frame.layout;
+    const Refusal kOk = Refusal::kNone, kBad = Refusal::kRpfSectionInvalid, kMissing = Refusal::kRpfSectionMissing;
     const Case cases[] = {
         // Cut short: before the spatial data the frame is refused; in it, the lines past the cut fail.
-        {"cut", {}, false, {}, {}, at.headerSection + 20}, {"cut", {}, false, {}, {}, at.locationSection + 30},
-        {"cut", {}, false, {}, {}, at.coverage + 50}, {"cut", {}, false, {}, {}, at.colormapSubsection + 200},
-        {"cut", {}, false, {}, {}, at.lookupSubsection + 40000},
-        {"cut in the third subframe", {}, true, {{0, 0, 767, true}, {30, 0, 767, false}, {0, 0, 1535, false},
+        {"cut", {}, kBad, {}, {}, at.headerSection + 20}, {"cut", {}, kBad, {}, {}, at.locationSection + 30},
+        {"cut", {}, kBad, {}, {}, at.coverage + 50}, {"cut", {}, kBad, {}, {}, at.colormapSubsection + 200},
+        {"cut", {}, kBad, {}, {}, at.lookupSubsection + 40000},
+        {"cut in the third subframe", {}, kOk, {{0, 0, 767, true}, {30, 0, 767, false}, {0, 0, 1535, false},
          {1, 0, 511, true}}, {}, at.spatialData + 2 * kRpfSubframeBytes + 500},
         // Spans in a code, across codes and subframes, whole rows, in masked subframe 3; outside or reversed.
-        {"undamaged", {}, true, {{0, 10, 9, false}, {5, 1, 10, true}, {6, 2, 2, true}, {7, 3, 4, true}, {8, 0, 3, true},
+        {"undamaged", {}, kOk, {{0, 10, 9, false}, {5, 1, 10, true}, {6, 2, 2, true}, {7, 3, 4, true}, {8, 0, 3, true},
           {255, 250, 262, true}, {256, 255, 256, true}, {1535, 0, 1535, true}, {1000, 1535, 1535, true},
           {77, 511, 1029, true}, {9, 600, 1100, true}, {3, 780, 790, true}, {1536, 0, 10, false},
           {0, 0, 1536, false}}},
-        {"0 rows", {{display, 0, 0, 4}}, false}, {"0 codes a row", {{display, 4, 0, 4}}, false},
-        {"2^30 codes a row", {{display, 4, 0x40000000, 4}}, false}, {"kernel width 0", {{image, 12, 2, 4}}, false},
-        {"kernel height 0", {{image, 16, 3, 4}}, false}, {"part kernels", {{image, 12, 258, 4}}, false},
-        {"mask table of 65535 x 65535", {{image, 8, 0xFFFF, 2}, {image, 10, 0xFFFF, 2}}, false},
-        {"location section past the file", {{&L::headerSection, 44, fileSize + 8, 4}}, false},
-        {"coverage past the file", {{location, kCoverageRecord + 6, fileSize - 50, 4}}, false},
-        {"coverage at 0xFFFFFFF0", {{location, kCoverageRecord + 6, 0xFFFFFFF0, 4}}, false},
+        {"0 rows", {{display, 0, 0, 4}}, kBad}, {"0 codes a row", {{display, 4, 0, 4}}, kBad},
+        {"2^30 codes a row", {{display, 4, 0x40000000, 4}}, kBad}, {"kernel width 0", {{image, 12, 2, 4}}, kBad},
+        {"kernel height 0", {{image, 16, 3, 4}}, kBad}, {"part kernels", {{image, 12, 258, 4}}, kBad},
+        {"mask table of 65535 x 65535", {{image, 8, 0xFFFF, 2}, {image, 10, 0xFFFF, 2}}, kBad},
+        {"location section past the file", {{&L::headerSection, 44, fileSize + 8, 4}}, kBad},
+        {"coverage past the file", {{location, kCoverageRecord + 6, fileSize - 50, 4}}, kBad},
+        {"coverage at 0xFFFFFFF0", {{location, kCoverageRecord + 6, 0xFFFFFFF0, 4}}, kBad},
         // No location records: the coverage is read from offset 0, where "NITF" is no latitude.
-        {"65535 location records", {{location, 6, 0xFFFF, 2}}, false}, {"none", {{location, 6, 0, 2}}, false},
-        {"2^28 lookup records", {{lookup, Lookup(0, 2), 0x10000000, 4}}, false}, {"sharing", sharing, false},
-        {"65535 offsets", {{codec, 2, 0xFFFF, 2}}, false}, {"compression algorithm 0", {{codec, 0, 0, 2}}, false},
-        {"2^31 colours", {{&L::colormapSubsection, 8, 0x7FFFFFFF, 4}}, false}, {"3", {{codec, 0, 3, 2}}, false},
-        {"parameter records", {{codec, 4, 1, 2}}, false}, {"0-bit codes", {{display, 8, 0, 1}}, true, codeRowFails},
-        {"lookup length 13", {{lookup, 4, 13, 2}}, false}, {"colour 16", {{&L::colormapSubsection, 4, 16, 2}}, false},
-        {"latitude 90", {{corners, 0, Bits(90.0), 8}}, true}, {"longitude -180", {{corners, 8, Bits(-180.0), 8}}, true},
-        {"latitude > 90", {{corners, 0, Bits(90.000001), 8}}, false}, {"NaN", {{corners, 56, Bits(NAN), 8}}, false},
-        {"a resolution is no corner", {{corners, 64, Bits(1e9), 8}}, true},
-        {"11-bit codes", {{display, 8, 11, 1}}, true, codeRowFails}, {"16", {{display, 8, 16, 1}}, true, codeRowFails},
+        {"65535 location records", {{location, 6, 0xFFFF, 2}}, kBad}, {"none", {{location, 6, 0, 2}}, kMissing},
+        {"2^28 lookup records", {{lookup, Lookup(0, 2), 0x10000000, 4}}, kBad}, {"sharing", sharing, kBad},
+        {"65535 offsets", {{codec, 2, 0xFFFF, 2}}, kBad}, {"compression algorithm 0", {{codec, 0, 0, 2}}, kBad},
+        {"2^31 colours", {{&L::colormapSubsection, 8, 0x7FFFFFFF, 4}}, kBad}, {"3", {{codec, 0, 3, 2}}, kBad},
+        {"parameter records", {{codec, 4, 1, 2}}, kBad}, {"0-bit codes", {{display, 8, 0, 1}}, kOk, codeRowFails},
+        {"lookup length 13", {{lookup, 4, 13, 2}}, kBad}, {"colour 16", {{&L::colormapSubsection, 4, 16, 2}}, kBad},
+        {"latitude 90", {{corners, 0, Bits(90.0), 8}}, kOk}, {"longitude -180", {{corners, 8, Bits(-180.0), 8}}, kOk},
+        {"latitude > 90", {{corners, 0, Bits(90.000001), 8}}, kBad}, {"NaN", {{corners, 56, Bits(NAN), 8}}, kBad},
+        {"a resolution is no corner", {{corners, 64, Bits(1e9), 8}}, kOk},
+        {"11-bit codes", {{display, 8, 11, 1}}, kOk, codeRowFails}, {"16", {{display, 8, 16, 1}}, kOk, codeRowFails},
         // Lookup records of 2 values decode (columns 2 and 3 of each code on rows 4k + 1 masked);
         // of 8 values, or of 16-bit values, no line of their kernel row.
-        {"2 values a record", {{lookup, Lookup(1, 6), 2, 2}}, true, {{6, 0, 1535, true}}, [](OpenedFrame& opened) {
+        {"2 values a record", {{lookup, Lookup(1, 6), 2, 2}}, kOk, {{6, 0, 1535, true}}, [](OpenedFrame& opened) {
              const std::vector<uint8_t> row = opened.Line(5);
              for (uint32_t column = 2; column < 256 && !row.empty(); column += 4)
                  ASSERT_EQ(row[column] + row[column + 1], 2 * kRpfMaskedPixel) << column;
          }},
-        {"8 values a record", {{lookup, Lookup(2, 6), 8, 2}}, true, {{6, 0, 1535, false}, {7, 0, 1535, true}}},
-        {"16-bit values", {{lookup, Lookup(3, 8), 16, 2}}, true, {{3, 0, 1535, false}, {4, 0, 1535, true}}},
+        {"8 values a record", {{lookup, Lookup(2, 6), 8, 2}}, kOk, {{6, 0, 1535, false}, {7, 0, 1535, true}}},
+        {"16-bit values", {{lookup, Lookup(3, 8), 16, 2}}, kOk, {{3, 0, 1535, false}, {4, 0, 1535, true}}},
         // 4-bit values: a masked code fills only the kernel (subframe 3), not the wider record.
-        {"4-bit values", {{lookup, Lookup(0, 6), 8, 2}, {lookup, Lookup(0, 8), 4, 2}}, true,
+        {"4-bit values", {{lookup, Lookup(0, 6), 8, 2}, {lookup, Lookup(0, 8), 4, 2}}, kOk,
          {{0, 768, 1000, true}, {0, 0, 10, false}}},
-        {"subframe 4 outside the file", {{&L::maskSubsection, 6 + 4 * 4, 0x7FFFFF00, 4}}, true,
+        {"subframe 4 outside the file", {{&L::maskSubsection, 6 + 4 * 4, 0x7FFFFF00, 4}}, kOk,
          {{10, 0, 1535, false}, {10, 0, 1023, true}, {11, 1024, 1100, false}, {300, 0, 1535, true}}},
-        {"no lookup offset records", {{codec, 2, 0, 2}}, true, {{0, 0, 1535, false}}},
-        {"the second compression algorithm", {{codec, 0, 2, 2}}, true,
+        {"no lookup offset records", {{codec, 2, 0, 2}}, kOk, {{0, 0, 1535, false}}},
+        {"the second compression algorithm", {{codec, 0, 2, 2}}, kOk,
          {{0, 0, 1535, true}, {801, 3, 1535, true}, {1535, 0, 1535, true}}},
-        {"no colour tables", {{&L::colorGraySubheader, 0, 0, 1}}, true, {{0, 0, 1535, true}}, [](OpenedFrame& opened) {
+        {"no colour tables", {{&L::colorGraySubheader, 0, 0, 1}}, kOk, {{0, 0, 1535, true}}, [](OpenedFrame& opened) {
              uint8_t grey = 0;
              RpfColorGraySection& colors = opened.reader.colorGraySection;
              EXPECT_FALSE(colors.IsColorTable() || colors.IsGrayTable() || colors.GetPaletteGray(0, grey));
          }},
         // A component listed twice: the first record in file order counts.
         {"coverage twice", {{location, kCoverageRecord - 10, kCoverageSectionSubheader, 2},
-          {location, kCoverageRecord - 4, frame.layout.coverage, 4}, {location, kCoverageRecord + 6, 0, 4}}, true, {},
+          {location, kCoverageRecord - 4, frame.layout.coverage, 4}, {location, kCoverageRecord + 6, 0, 4}}, kOk, {},
          [&frame](OpenedFrame& opened) {
              EXPECT_EQ(opened.reader.FindComponentLocation(kCoverageSectionSubheader), frame.layout.coverage);
              EXPECT_EQ(opened.reader.FindComponentLocation(kColorConverterSubsection), 0u);
@@ -145,7 +146,8 @@ TEST(RpfBadInput, RefusedAtOpenOrOnlyTheLinesTheDamageMeets)
             PatchRpfNumber(damaged, damaged.layout.*edit.part + edit.at, edit.value, edit.width);
         damaged.bytes.resize(c.cutTo ? c.cutTo : damaged.bytes.size());
         OpenedFrame opened(damaged);
-        ASSERT_EQ(opened.opened, c.opens) << c.what << " " << c.cutTo;
+        ASSERT_EQ(opened.opened, c.why == kOk) << c.what << " " << c.cutTo;
+        EXPECT_EQ(opened.reader.refusal, c.why) << c.what;
         for (const Line& line : c.lines) {
             const uint8_t* from = expected.data() + size_t(line.row) * kRpfFrameSide;
             const std::vector<uint8_t> undamaged(from + line.first, from + (line.decodes ? line.last + 1 : line.first));
