@@ -156,35 +156,31 @@ struct OpenedJpeg {
         : file(data), opened(OpenJpeg(decoder, file, blocks, bands, side * blocks, side, side, side, downsampled))
     {
     }
-    // Columns first to last of a row of a grey block; empty when GetRow fails.
-    Bytes Row(uint32_t block, uint32_t row, uint32_t first = 0, uint32_t last = kSide - 1)
+    // Columns first to last of a row of a block, one byte per band; empty when GetRow fails.
+    Bytes Row(uint32_t block, uint32_t row, uint32_t first = 0, uint32_t last = kSide - 1, uint32_t bands = 1)
     {
-        Bytes pixels(last - first + 1);
+        Bytes pixels((last - first + 1) * bands);
         return decoder.GetRow(file.reader, block, row, first, last, uint32_t(pixels.size()), pixels.data()) ? pixels : Bytes{};
-    }
-    // Every row of a block, as GetRow delivers them.
-    Bytes Block(uint32_t block, uint32_t bands = 1)
-    {
-        Bytes pixels(kSide * kSide * bands);
-        for (uint32_t row = 0; row < kSide; ++row)
-            EXPECT_TRUE(decoder.GetRow(file.reader, block, row, 0, kSide - 1, kSide * bands, pixels.data() + row * kSide * bands));
-        return pixels;
     }
 };
 
-// Colour coded as R,G,B or YCbCr. Lossless: every predictor, grey and colour, restart intervals, a point
-// transform dropping two low bits. Tables left out are the NITF defaults of the APP6 quality; without a
-// quality only a DHT may be missing. A comment in front pushes the frame header past the first 100 bytes
-// the table scan reads. No rows (nothing expected): a frame larger than the block, 65535 x 65535 declared
-// in a small stream, lossless streams cut in half or of 12-bit samples; 32000 x 32000 declared over a few
-// bytes of data (C3 decoded by rows stops where the data ends, C5 beyond the bound is not decoded).
+// Each stream draws every row of its 16 x 16 block as its reference, or none (nothing expected), and a
+// span that starts mid-block. Colour coded as R,G,B or YCbCr. Lossless: every predictor, grey and colour,
+// restart intervals, a point transform dropping two low bits. Tables left out are the NITF defaults of
+// the APP6 quality; without a quality only a DHT may be missing. A comment in front pushes the frame
+// header past the first 100 bytes the table scan reads. Frames that do not fill the block, but an "I1"
+// frame's rows are its pixels repeated (across, down) times. No rows: more components than bands, a frame
+// larger than the block, 65535 x 65535 declared in a small stream, lossless streams cut in half or of
+// 12-bit samples; 32000 x 32000 declared over a few bytes of data (C3 decoded by rows stops where the
+// data ends, C5 beyond the bound is not decoded).
 TEST(JpegDecode, StreamsDecodeAsTheirReference)
 {
     struct Case {
         std::string what;
         Bytes stream, expected;
-        int components = 1;
+        uint32_t bands = 1;
         uint8_t quality = 0, streamColor = 0; // the APP6 streamColor: 0 grey, 1 R,G,B coded, 2 YCbCr coded
+        bool downsampled = false;
     };
     std::vector<Case> cases;
     for (bool rgbCoding : {false, true}) {
@@ -199,7 +195,7 @@ TEST(JpegDecode, StreamsDecodeAsTheirReference)
                 pixels, JpegBlockPlan{kSide, kSide, components, false, predictor, shift, predictor == 4 ? 4u : 0u});
             for (uint8_t& value : pixels)
                 value &= uint8_t(0xFF << shift);
-            cases.push_back({"lossless predictor " + std::to_string(predictor), stream, pixels, components});
+            cases.push_back({"lossless predictor " + std::to_string(predictor), stream, pixels, uint32_t(components)});
         }
     const Bytes grey = TestPattern(kSide, kSide, 1, 7);
     Bytes comment = {0xFF, 0xFE, 0x00, 0x5F};
@@ -214,6 +210,22 @@ TEST(JpegDecode, StreamsDecodeAsTheirReference)
             cases.push_back({what, stream, complete, 1, quality});
             cases.push_back({what + " not in APP6", stream, keepDqt ? complete : Bytes{}});
         }
+    }
+    struct Fill { const char* what; uint32_t width, height; int components; bool downsampled; uint32_t across, down; };
+    for (const Fill& f : {Fill{"8 rows of a 16-row block", kSide, 8, 1, false, 0, 0},
+                          {"8 columns of a 16-column block", 8, kSide, 1, false, 0, 0},
+                          {"three components in a one-band image", kSide, kSide, 3, false, 0, 0},
+                          {"I1 whole frame", kSide, kSide, 1, true, 1, 1}, {"I1 5 columns: each 4 times", 5, kSide, 1, true, 4, 1},
+                          {"I1 halved across, quartered down", 8, 4, 1, true, 2, 4}, {"I1 2 x 2: each 8 times", 2, 2, 1, true, 8, 8},
+                          {"I1 1 column: 16 times is more than 8", 1, kSide, 1, true, 0, 0},
+                          {"I1 three components in a one-band image", 8, 8, 3, true, 0, 0}}) {
+        const Bytes frame = EncodeJpegBlock(TestPattern(f.width, f.height, f.components, 21),
+                                            JpegBlockPlan{f.width, f.height, f.components});
+        const Bytes decoded = DecodeJpegBlock(frame, f.components);
+        Bytes expected;
+        for (uint32_t i = 0; f.across != 0 && i < kSide * kSide; ++i)
+            expected.push_back(decoded[(i / kSide / f.down) * f.width + i % kSide / f.across]);
+        cases.push_back({f.what, frame, expected, 1, 0, 0, f.downsampled});
     }
     const Bytes lossless = EncodeJpegBlock(grey, JpegBlockPlan{kSide, kSide, 1, false, 1});
     Bytes halfLossless(lossless.begin(), lossless.begin() + long(lossless.size() / 2));
@@ -234,57 +246,38 @@ TEST(JpegDecode, StreamsDecodeAsTheirReference)
     // (a sanitizer's shadow memory takes a few of its own).
     const long mostPagesTouched = (768L << 20) / sysconf(_SC_PAGESIZE);
     for (const Case& c : cases) {
-        SCOPED_TRACE(c.what + ", " + std::to_string(c.components) + " components");
+        SCOPED_TRACE(c.what + ", " + std::to_string(c.bands) + " bands");
         rusage before{}, after{};
         getrusage(RUSAGE_SELF, &before);
-        OpenedJpeg image(BuildNitfJpegData({c.stream}, NitfApp6Plan{1, 1, c.quality, c.streamColor}), 1,
-                         uint32_t(c.components), false, c.what.find("32000") == std::string::npos ? kSide : 32000);
-        Bytes first(3 * kSide);
-        ASSERT_EQ(image.opened && image.decoder.GetRow(image.file.reader, 0, 0, 0, kSide - 1, 3 * kSide, first.data()),
-                  !c.expected.empty());
+        OpenedJpeg image(BuildNitfJpegData({c.stream}, NitfApp6Plan{1, 1, c.quality, c.streamColor}), 1, c.bands,
+                         c.downsampled, c.what.find("32000") == std::string::npos ? kSide : 32000);
+        ASSERT_EQ(image.opened && !image.Row(0, 0, 0, kSide - 1, c.bands).empty(), !c.expected.empty());
         getrusage(RUSAGE_SELF, &after);
         EXPECT_LT(after.ru_minflt - before.ru_minflt, mostPagesTouched);
-        if (!c.expected.empty()) {
-            EXPECT_EQ(image.Block(0, uint32_t(c.components)), c.expected);
-            EXPECT_EQ(image.decoder.loaderConverted, c.components == 3 ? 1 : 0);
+        for (uint32_t row = 0; row < kSide && image.opened; ++row) {
+            const auto at = c.expected.begin() + row * kSide * c.bands;
+            EXPECT_EQ(image.Row(0, row, 0, kSide - 1, c.bands), c.expected.empty() ? Bytes{} : Bytes(at, at + kSide * c.bands));
+            EXPECT_EQ(image.Row(0, row, 3, 12, c.bands), c.expected.empty() ? Bytes{} : Bytes(at + 3 * c.bands, at + 13 * c.bands))
+                << "row " << row;
         }
+        EXPECT_TRUE(c.expected.empty() || image.decoder.loaderConverted == (c.bands == 3 ? 1 : 0)) << "converted";
     }
 }
 
-// Block 0 holds a whole frame; block 1 the case's frame, whose rows are its pixels repeated
-// (across, down) times ("I1"), or fail (0) when it does not fill the block. Rows, spans, blocks
-// and byte counts beyond what is there are refused, and no byte is written past those asked.
-TEST(JpegDecode, BlocksGiveRowsOnlyFromFramesThatFillThem)
+// Block 0 holds a whole frame, block 1 one that does not fill its block. Rows, spans, blocks and byte
+// counts beyond what is there are refused, and no byte is written past those asked.
+TEST(JpegDecode, BlocksGiveOnlyTheRowsAndSpansAsked)
 {
-    struct Case { const char* what; uint32_t width, height; int components; bool downsampled; uint32_t across, down; };
-    const Case cases[] = {{"8 rows of a 16-row block", kSide, 8, 1, false, 0, 0},
-                          {"8 columns of a 16-column block", 8, kSide, 1, false, 0, 0},
-                          {"three components in a one-band image", kSide, kSide, 3, false, 0, 0},
-                          {"I1 whole frame", kSide, kSide, 1, true, 1, 1},
-                          {"I1 halved across, quartered down", 8, 4, 1, true, 2, 4},
-                          {"I1 5 columns: each 4 times", 5, kSide, 1, true, 4, 1},
-                          {"I1 2 x 2: each 8 times", 2, 2, 1, true, 8, 8},
-                          {"I1 1 column: 16 times is more than 8", 1, kSide, 1, true, 0, 0},
-                          {"I1 three components in a one-band image", 8, 8, 3, true, 0, 0}};
     const Bytes whole = EncodeJpegBlock(TestPattern(kSide, kSide, 1, 20), {});
     const Bytes wholeDecoded = DecodeJpegBlock(whole, 1);
-    for (const Case& c : cases) {
-        SCOPED_TRACE(c.what);
-        const Bytes frame = EncodeJpegBlock(TestPattern(c.width, c.height, c.components, 21),
-                                            JpegBlockPlan{c.width, c.height, c.components});
-        const Bytes decoded = DecodeJpegBlock(frame, c.components);
-        OpenedJpeg image(BuildNitfJpegData({whole, frame}, NitfApp6Plan{2, 1, 0, 0}), 2, 1, c.downsampled);
+    for (bool downsampled : {false, true}) {
+        OpenedJpeg image(BuildNitfJpegData({whole, EncodeJpegBlock(TestPattern(kSide, 8, 1, 2), JpegBlockPlan{kSide, 8})},
+                                           NitfApp6Plan{2, 1, 0, 0}), 2, 1, downsampled);
         ASSERT_TRUE(image.opened);
         EXPECT_EQ(image.decoder.app6[12] | (image.decoder.app6[13] << 8), 2); // blocks per row, host order
-        EXPECT_EQ(image.Block(0), wholeDecoded);
-        for (uint32_t row = 0; row < kSide; ++row) {
-            Bytes expected;
-            for (uint32_t column = 0; c.across != 0 && column < kSide; ++column)
-                expected.push_back(decoded[(row / c.down) * c.width + column / c.across]);
-            EXPECT_EQ(image.Row(1, row), expected) << "row " << row;
-            EXPECT_EQ(image.Row(1, row, 3, 12), c.across ? Bytes(expected.begin() + 3, expected.begin() + 13) : Bytes{})
-                << "row " << row; // a span starting mid-block
-        }
+        for (uint32_t row = 0; row < kSide; ++row)
+            EXPECT_TRUE(image.Row(1, row).empty() != downsampled && image.Row(0, row) == Bytes(&wholeDecoded[row * kSide], &wholeDecoded[row * kSide + kSide]))
+                << "row " << row;
         // Columns 10 to 15 of row 5: six bytes asked, the rest untouched; more asked: only what is there.
         Bytes span(40, 0xEE);
         for (uint32_t asked : {6u, 40u})
@@ -297,11 +290,18 @@ TEST(JpegDecode, BlocksGiveRowsOnlyFromFramesThatFillThem)
     }
 }
 
-// A stream cut anywhere in its scan: the rows decoded before the cut come out
-// as libjpeg decodes the whole stream, the rest fail.
-TEST(JpegDecode, StreamCutShortGivesOnlyTheRowsBeforeTheCut)
+// A stream cut anywhere in its scan: the rows decoded before the cut come out as libjpeg decodes the
+// whole stream, the rest fail. Entropy-coded data overwritten: whatever libjpeg makes of it, no crash and
+// no hang. Streams are found as their rows are asked for: a block without EOI fails its rows, and without
+// a mask table so does every block after it, while those before it draw. Only a first stream that breaks
+// before its scan is damaged data at open. A second Open without FreeBitmaps is refused. Preparing needs
+// the NITF APP6 segment (identifier "NITF") at the data offset and 8-bit samples; opening needs a
+// prepared decoder. More blocks than the data can hold: refused before anything is allocated.
+TEST(JpegDecode, DamagedStreamsAndDecodersNotPreparedFailCleanly)
 {
-    const Bytes stream = EncodeJpegBlock(TestPattern(kSide, kSide, 1, 22), {});
+    JpegBlockPlan open;
+    open.keepEoi = false;
+    const Bytes pattern = TestPattern(kSide, kSide, 1, 4), stream = EncodeJpegBlock(pattern, {});
     const Bytes decoded = DecodeJpegBlock(stream, 1);
     size_t scan = 2;
     while (!(stream[scan] == 0xFF && stream[scan + 1] == 0xDA))
@@ -321,18 +321,12 @@ TEST(JpegDecode, StreamCutShortGivesOnlyTheRowsBeforeTheCut)
         rowsGiven.insert(rows);
     }
     EXPECT_EQ(rowsGiven, (std::set<uint32_t>{0, 8}));
-}
-
-// Streams are found as their rows are asked for: a block without EOI fails its rows, and without a
-// mask table so does every block after it, while those before it draw. Only a first stream that breaks
-// before its scan is damaged data at open. A second Open without FreeBitmaps is refused. Entropy-coded
-// data overwritten: whatever libjpeg makes of it, no crash and no hang.
-TEST(JpegDecode, DamagedStreamsFailTheirOwnRows)
-{
-    JpegBlockPlan open;
-    open.keepEoi = false;
-    const Bytes pattern = TestPattern(kSide, kSide, 1, 1), good = EncodeJpegBlock(pattern, {});
-    const Bytes data = BuildNitfJpegData({good, EncodeJpegBlock(pattern, open), good}, {});
+    Bytes corrupt = stream;
+    for (size_t at = corrupt.size() - 40; at < corrupt.size() - 2; ++at)
+        corrupt[at] = uint8_t(at * 97);
+    OpenedJpeg damaged(BuildNitfJpegData({corrupt}, {}), 1);
+    EXPECT_TRUE(!damaged.opened || !damaged.Row(0, 0).empty());
+    Bytes data = BuildNitfJpegData({stream, EncodeJpegBlock(pattern, open), stream}, {});
     for (size_t size : {data.size(), size_t(100)}) {
         DataFile file(Bytes(data.begin(), data.begin() + long(size)));
         CLeadToolLibWrapper decoder;
@@ -350,18 +344,6 @@ TEST(JpegDecode, DamagedStreamsFailTheirOwnRows)
         decoder.FreeBitmaps();
         EXPECT_FALSE(decoder.GetRow(file.reader, 0, 0, 0, kSide - 1, kSide, row.data()));
     }
-    Bytes corrupt = EncodeJpegBlock(TestPattern(kSide, kSide, 1, 4), {});
-    for (size_t at = corrupt.size() - 40; at < corrupt.size() - 2; ++at)
-        corrupt[at] = uint8_t(at * 97);
-    OpenedJpeg damaged(BuildNitfJpegData({corrupt}, {}), 1);
-    EXPECT_TRUE(!damaged.opened || !damaged.Row(0, 0).empty());
-}
-
-// Preparing needs the NITF APP6 segment (identifier "NITF") at the data offset and 8-bit samples;
-// opening needs a prepared decoder. More blocks than the data can hold: refused before anything is allocated.
-TEST(JpegDecode, DecodersNotPreparedOrOfTooManyBlocksFailCleanly)
-{
-    Bytes data = BuildNitfJpegData({EncodeJpegBlock(TestPattern(kSide, kSide, 1, 4), {})}, {});
     DataFile file(data);
     CLeadToolLibWrapper decoder, huge;
     EXPECT_FALSE(decoder.PrepareJpeg(file.reader, kOffset, 0, 12) || decoder.PrepareJpeg(file.reader, kOffset, 0, 16) ||
