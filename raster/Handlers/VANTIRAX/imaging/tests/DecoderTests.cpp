@@ -2,11 +2,8 @@
 // (IC "C1") T.4 strips coded by libtiff, decoded bit for bit; NITF JPEG data (IC "C3"/"M3", lossless
 // "C5") coded by libjpeg and the lossless fixture writer, each stream decoding as its reference
 // (libjpeg's decoding, or the samples themselves); and the data and calls it must refuse.
-#include "imaging/ImagingLibrary.h"
 #include "imaging/LeadToolLibWrapper.h"
-#include "imaging/NitfJpegDefaults.h"
 #include "base/ByteOrder.h"
-#include "base/FileReader.h"
 #include "tests/fixtures/BiLevelWriter.h"
 #include "tests/fixtures/JpegBlockWriter.h"
 #include "tests/fixtures/TempFiles.h"
@@ -16,6 +13,7 @@
 #include <set>
 #include <stdexcept>
 #include <string>
+#include <utility>
 
 #include <sys/resource.h>
 #include <unistd.h>
@@ -53,29 +51,30 @@ bool OpenBiLevel(CLeadToolLibWrapper& decoder, DataFile& file, uint32_t LI, uint
 
 TEST(Binding, NeedsBothModulesAndEveryEntryPointAndBindsAgainAfterAReset)
 {
-    // The built-in modules less one entry point of a module, or (entry entryCount) the module; module
-    // moduleCount: neither module.
+    // The built-in modules with one entry point or one module named so the look-up misses it; then none.
     const ImagingModuleTable& builtIn = BuiltInImagingModules();
-    const size_t moduleCount = builtIn.moduleCount;
-    for (size_t module = 0; module <= moduleCount; ++module)
-        for (size_t entry = 0; entry <= (module < moduleCount ? builtIn.modules[module].entryCount : 0); ++entry) {
-            std::vector<std::vector<ImagingEntry>> entries(moduleCount);
-            std::vector<ImagingModule> modules;
-            for (size_t m = 0; m < moduleCount && module < moduleCount; ++m) {
-                for (size_t e = 0; e < builtIn.modules[m].entryCount; ++e)
-                    if (m != module || e != entry)
-                        entries[m].push_back(builtIn.modules[m].entries[e]);
-                if (m != module || entry < builtIn.modules[m].entryCount)
-                    modules.push_back({builtIn.modules[m].name, entries[m].data(), entries[m].size()});
-            }
-            const ImagingModuleTable partial{modules.data(), modules.size()};
-            ResetLibrary();
-            UseImagingModules(&partial);
-            CLeadToolLibWrapper decoder;
-            EXPECT_FALSE(EnsureLibrary() || decoder.PrepareBiLevel() || decoder.kind != kNotPrepared)
-                << "module " << module << " entry " << entry;
-            UseImagingModules(nullptr);
-        }
+    std::vector<std::vector<ImagingEntry>> entries;
+    std::vector<ImagingModule> modules(builtIn.modules, builtIn.modules + builtIn.moduleCount);
+    std::vector<const char**> names;
+    for (ImagingModule& module : modules) {
+        entries.emplace_back(module.entries, module.entries + module.entryCount);
+        module.entries = entries.back().data();
+        for (ImagingEntry& entry : entries.back())
+            names.push_back(&entry.name);
+        names.push_back(&module.name);
+    }
+    names.push_back(nullptr);
+    for (const char** name : names) {
+        const char* kept = name ? std::exchange(*name, "missing") : "every module";
+        const ImagingModuleTable partial{modules.data(), name ? modules.size() : 0};
+        ResetLibrary();
+        UseImagingModules(&partial);
+        CLeadToolLibWrapper decoder;
+        EXPECT_FALSE(EnsureLibrary() || decoder.PrepareBiLevel() || decoder.kind != kNotPrepared) << kept << " missing";
+        UseImagingModules(nullptr);
+        if (name)
+            *name = kept;
+    }
     ResetLibrary();
     ImagingBinding binding{};
     EXPECT_TRUE(!CopyBinding(binding) && binding.L_LoadMemory == nullptr);
@@ -84,24 +83,12 @@ TEST(Binding, NeedsBothModulesAndEveryEntryPointAndBindsAgainAfterAReset)
     EXPECT_TRUE(CopyBinding(binding) && binding.L_LoadMemory != nullptr);
 }
 
-// Rows of (width + 7) / 8 bytes, a set bit black.
-Bytes PackedPattern(uint32_t width, uint32_t height)
-{
-    const uint32_t stride = (width + 7) / 8;
-    Bytes packed(size_t(stride) * height);
-    for (uint32_t y = 0; y < height; ++y)
-        for (uint32_t x = 0; x < width; ++x)
-            if ((x / 5 + y / 3) % 3 == 0 || x == y)
-                packed[y * stride + x / 8] |= uint8_t(0x80 >> (x % 8));
-    return packed;
-}
-
 // 1-D and 2-D strips decode bit for bit. Garbage, or a strip cut short: whatever comes out, no crash.
 // LI beyond the file, and more rows than the strip has bits: refused before decoding.
 TEST(BiLevelDecode, StripsDecodeBitForBitAndBadOnesFailCleanly)
 {
     constexpr uint32_t kWidth = 77, kHeight = 23, kStride = (kWidth + 7) / 8; // rows of no whole number of bytes
-    const Bytes packed = PackedPattern(kWidth, kHeight);
+    const Bytes packed = TestPattern(kStride, kHeight, 1, 3); // rows of kStride bytes, a set bit black
     for (bool twoDimensional : {false, true}) {
         const Bytes strip = EncodeT4Strip(packed, kWidth, kHeight, twoDimensional);
         DataFile file(strip);
@@ -374,7 +361,7 @@ TEST(RowDecoding, BlocksBeyondTheBoundDrawAsDecodedWholeInAnyOrder)
         return BuildNitfJpegData({stream}, NitfApp6Plan{1, 1, quality, uint8_t(components == 3 ? 2 : 0)});
     };
     struct Case { const char* what; Bytes data; int components; bool byRows; };
-    for (const Case& c : {Case{"bi-level", EncodeT4Strip(PackedPattern(kWide, 2048), kWide, 2048, true), 0, true},
+    for (const Case& c : {Case{"bi-level", EncodeT4Strip(TestPattern(kWide / 8, 2048, 1, 9), kWide, 2048, true), 0, true},
                           {"grey", jpeg(1, [](JpegBlockPlan&) {}, 0), 1, true},
                           {"colour, restarts", jpeg(3, [](JpegBlockPlan& p) { p.restartRows = 3; }, 0), 3, true},
                           {"no tables", jpeg(1, [](JpegBlockPlan& p) { p.keepDqt = p.keepDht = false; }, 2), 1, true},
