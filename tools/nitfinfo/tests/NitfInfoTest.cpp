@@ -31,30 +31,26 @@ Outcome RunInfo(const std::string& arguments)
     return {WIFEXITED(status) ? WEXITSTATUS(status) : -1, out, ReadWholeFile(err.path())};
 }
 
-// The first group of every match of the pattern.
-std::set<std::string> Matches(const std::string& text, const std::string& pattern)
+// Every match of the pattern: its first group mapped to its second (if any), the last match winning.
+std::map<std::string, std::string> Matches(const std::string& text, const std::string& pattern)
 {
     const std::regex expression(pattern);
-    std::set<std::string> found;
+    std::map<std::string, std::string> found;
     for (std::sregex_iterator it(text.begin(), text.end(), expression), end; it != end; ++it)
-        found.insert((*it)[1]);
+        found[(*it)[1]] = (*it)[2];
     return found;
 }
 
-// Every "  KEY=value" line of gdalinfo -mdd TRE (NITF_ fields, subdatasets), the size, the band count and
-// the TRE section.
+// What gdalinfo -mdd TRE says: every "  KEY=value" line (NITF_ fields, subdatasets), the size, the band
+// count and the TRE section.
 std::map<std::string, std::string> GdalFields(const std::string& path)
 {
     const std::string text = RunCommand("gdalinfo -mdd TRE '" + path + "'");
-    std::map<std::string, std::string> fields{{"bands", std::to_string(NumbersIn(text, "\nBand \\d").size())}};
-    std::smatch match;
-    for (auto it = text.cbegin(); std::regex_search(it, text.cend(), match, std::regex("\n  (\\w+)=([^\n]*)"));
-         it = match[0].second)
-        fields[match[1]] = match[2];
-    if (std::regex_search(text, match, std::regex("Metadata \\(TRE\\):([^]*?)\n[A-Z]")))
-        fields["TREs"] = match[1];
-    if (std::regex_search(text, match, std::regex("Size is (\\d+), (\\d+)")))
-        fields["size"] = match[1].str() + "x" + match[2].str();
+    std::map<std::string, std::string> fields = Matches(text, "\n  (\\w+)=([^\n]*)");
+    fields["bands"] = std::to_string(NumbersIn(text, "\nBand \\d").size());
+    fields["TREs"] = Matches(text, "Metadata \\(TRE\\):()([^]*?)\n[A-Z]")[""];
+    for (const auto& [width, height] : Matches(text, "Size is (\\d+), (\\d+)"))
+        fields["size"] = width + "x" + height;
     return fields;
 }
 
@@ -84,9 +80,7 @@ const InfoCase kCases[] = {
 TEST(NitfInfo, FieldsAgreeWithGdal)
 {
     VX_SKIP_WITHOUT_GDAL();
-    const bool haveCorpus = std::filesystem::is_directory(CorpusPath());
-    if (!haveCorpus)
-        std::cout << "no corpus at " << CorpusPath() << ": only the fixture files are compared\n";
+    const bool haveCorpus = std::filesystem::is_directory(CorpusPath()); // else only the fixture files compare
     TempDirectory folder;
     for (const InfoCase& row : kCases) {
         if (!row.sample && !haveCorpus)
