@@ -93,13 +93,6 @@ const NitfBandPlan plain{"", 0, 0, ""}, red{"R", 0, 0, ""}, green{"G", 0, 0, ""}
 const NitfBandPlan rgbLut{"LU", 3, 2, RgbLookupTables(2)};
 const std::vector<NitfBandPlan> kRgbBands = {red, green, blue};
 
-NitfImagePlan BlockedRgb(char IMODE, const std::string& IC = "NC")
-{
-    NitfImagePlan plan = Layout("RGB", 8, kRgbBands, IMODE);
-    plan.IC = IC;
-    return plan;
-}
-
 // The writer's 16-bit blocks repacked to NBPP 1 or 12: each band's block bit after bit, padded to a byte;
 // a 12-bit value's low byte first, then its high nibble.
 std::vector<std::string> PackedBlocks(NitfImagePlan plan, const PixelValue& pixel)
@@ -142,17 +135,16 @@ TEST(Image, EveryLayoutDrawsThePixelsWritten)
     // IC "NM": the mask table leaves out block 1 (of band 0 in IMODE "S"), drawn as 0. The band stride
     // of IMODE "S" is a whole band of padded blocks, not NROWS x NCOLS.
     for (const char* IC : {"NC", "NM"})
-        for (char IMODE : {'B', 'P', 'R', 'S'})
-            cases.push_back({BlockedRgb(IMODE, IC), false});
+        for (char IMODE : {'B', 'P', 'R', 'S'}) {
+            cases.push_back({Layout("RGB", 8, kRgbBands, IMODE), false});
+            cases.back().first.IC = IC;
+        }
     for (bool version21 : {true, false})
         for (bool subheaderEvent : {false, true})
             for (char ICORDS : {' ', 'N'}) {
                 NitfImagePlan plan = Plan(3, 4);
-                plan.version21 = version21;
-                plan.downgradeEvent = subheaderEvent && !version21;
-                plan.ICORDS = ICORDS;
-                plan.IGEOLO = std::string(60, '1');
-                plan.comments.assign(subheaderEvent ? 2 : 0, "comment");
+                plan.version21 = version21, plan.downgradeEvent = subheaderEvent && !version21, plan.ICORDS = ICORDS;
+                plan.IGEOLO = std::string(60, '1'), plan.comments.assign(subheaderEvent ? 2 : 0, "comment");
                 plan.padding = subheaderEvent ? "PAD" : ""; // bytes after the last field, counted in LISH
                 plan.UDID = plan.IXSHD = subheaderEvent ? "extension data" : "";
                 cases.push_back({plan, !version21 && ICORDS == 'N'});
@@ -175,20 +167,15 @@ TEST(Image, EveryLayoutDrawsThePixelsWritten)
         const uint32_t subheaderEnd = loaded.header.HL + loaded.header.imageSegments[0].subheaderLength;
         EXPECT_EQ(loaded.image.dataOffset, subheaderEnd + maskTable);
         const int32_t bands = int32_t(plan.bands.size()), blockWidth = plan.NPPBH ? plan.NPPBH : plan.columns;
-        const int32_t blockHeight = plan.NPPBV ? plan.NPPBV : plan.rows;
         for (int32_t row = 0; row < plan.rows; ++row) {
             std::vector<uint8_t> expected;
-            for (int32_t column = 0; column < plan.columns; ++column)
-                for (int32_t band = 0; band < bands; ++band) {
-                    const size_t block = size_t(row / blockHeight * plan.NBPR + column / blockWidth +
-                                                (plan.IMODE == 'S' ? band * plan.NBPR * plan.NBPC : 0));
-                    expected.push_back(stored[block] ? uint8_t(Ramp(band, row, column)) : 0);
-                }
-            EXPECT_EQ(loaded.Row(uint32_t(row)), expected) << "row " << row;
-            // A span from the middle of one block into the next.
-            EXPECT_EQ(loaded.Row(uint32_t(row), 2, plan.columns - 2),
-                      std::vector<uint8_t>(expected.begin() + 2 * bands, expected.end() - bands))
-                << "row " << row;
+            for (int32_t i = 0; i < plan.columns * bands; ++i) { // i: column x bands + band
+                const int32_t column = i / bands, band = i % bands, blockRow = plan.NPPBV ? row / plan.NPPBV : 0;
+                const int32_t block = blockRow * plan.NBPR + column / blockWidth + (plan.IMODE == 'S' ? band * plan.NBPR * plan.NBPC : 0);
+                expected.push_back(stored[size_t(block)] ? uint8_t(Ramp(band, row, column)) : 0);
+            }
+            EXPECT_EQ(loaded.Row(uint32_t(row)), expected) << "row " << row; // then a span across a block edge:
+            EXPECT_EQ(loaded.Row(uint32_t(row), 2, plan.columns - 2), Bytes(expected.begin() + 2 * bands, expected.end() - bands));
         }
         // Spans outside the image are refused, without a byte written.
         std::vector<uint8_t> out(64, 0xEE);
@@ -204,15 +191,9 @@ TEST(Image, EveryLayoutDrawsThePixelsWritten)
 // NBPP with PJUST "L"); the palette is the lookup table's, or without one a grey ramp whatever NBPP.
 TEST(Image, RowAndPaletteOfWideSamplesAndLookupTables)
 {
-    struct Case {
-        std::string IREP;
-        int32_t NBPP, ABPP;
-        char PJUST;
-        NitfBandPlan band;
-        std::vector<uint64_t> pixels;
-        std::vector<uint8_t> row;
-        int32_t size, index;         // palette entries, an entry read
-        std::vector<uint8_t> colour; // its colour
+    struct Case { // size: the palette entries; colour: that of entry index
+        std::string IREP; int32_t NBPP, ABPP; char PJUST; NitfBandPlan band; std::vector<uint64_t> pixels; Bytes row;
+        int32_t size, index; Bytes colour;
     };
     const NitfBandPlan grey{};
     for (const Case& c :
@@ -243,17 +224,14 @@ TEST(Image, RowAndPaletteOfWideSamplesAndLookupTables)
 // (stage 0) or when the data is prepared (stage 1), each for its reason; stage 2: prepared.
 TEST(Image, RefusesWhatTheFileCannotBackAndWhatIsNotServed)
 {
-    const std::vector<std::string> blocks = BuildImageBlocks(BlockedRgb('B'), Ramp);
+    const std::vector<std::string> blocks = BuildImageBlocks(Layout("RGB", 8, kRgbBands), Ramp);
     const std::string data = JoinBlocks(blocks);
     using Change = std::function<void(NitfImagePlan&)>;
     using R = Refusal;
-    struct Case {
-        const char* what;
-        int stage;
-        Refusal why;
-        Change change = nullptr;
-        std::string data = "", find = "", replace = ""; // data "": the blocks as written; find replaced in the file
-        size_t cut = 0;                                 // bytes cut from the end of the file
+    const auto As = [](const NitfImagePlan& plan) { return [plan](NitfImagePlan& p) { p = plan; }; };
+    struct Case { // data "": the blocks as written ("packed": repacked); find replaced in the file; cut: bytes cut from its end
+        const char* what; int stage; Refusal why; Change change = nullptr; std::string data = "", find = "", replace = "";
+        size_t cut = 0;
     };
     for (const Case& c : std::vector<Case>{
              {"as written", 2, R::kNone},
@@ -281,17 +259,14 @@ TEST(Image, RefusesWhatTheFileCannotBackAndWhatIsNotServed)
               [](NitfImagePlan& p) { p.IC = "NM"; p.NBPR = p.NBPC = 999; },
               BuildMaskedData(blocks, std::vector<bool>(4, true))},
              // Packed pixels: 1-bit colours, 12-bit bands packed together, and data a byte short.
-             {"NBPP 1 MULTI", 1, R::kUnservedDepth, [](NitfImagePlan& p) { p = Layout("MULTI", 1, kRgbBands); }, "packed"},
-             {"NBPP 1 RGB", 1, R::kUnservedDepth, [](NitfImagePlan& p) { p = Layout("RGB", 1, kRgbBands); }, "packed"},
-             {"NBPP 12 IMODE P", 1, R::kUnservedDepth, [](NitfImagePlan& p) { p = Layout("MONO", 12, {plain, plain}, 'P'); },
-              "packed"},
-             {"NBPP 12 IMODE R", 1, R::kUnservedDepth, [](NitfImagePlan& p) { p = Layout("MONO", 12, {plain, plain}, 'R'); },
-              "packed"},
-             {"NBPP 12 RGB/LUT", 1, R::kUnservedDepth, [](NitfImagePlan& p) { p = Layout("RGB/LUT", 12, {rgbLut}); }, "packed"},
-             {"NBPP 12", 2, R::kNone, [](NitfImagePlan& p) { p = Layout("MONO", 12, {plain}); }, "packed"},
-             {"NBPP 12, a byte short", 1, R::kDataOutsideFile, [](NitfImagePlan& p) { p = Layout("MONO", 12, {plain}); },
-              "packed, a byte short"}}) {
-        NitfImagePlan plan = BlockedRgb('B');
+             {"NBPP 1 MULTI", 1, R::kUnservedDepth, As(Layout("MULTI", 1, kRgbBands)), "packed"},
+             {"NBPP 1 RGB", 1, R::kUnservedDepth, As(Layout("RGB", 1, kRgbBands)), "packed"},
+             {"NBPP 12 IMODE P", 1, R::kUnservedDepth, As(Layout("MONO", 12, {plain, plain}, 'P')), "packed"},
+             {"NBPP 12 IMODE R", 1, R::kUnservedDepth, As(Layout("MONO", 12, {plain, plain}, 'R')), "packed"},
+             {"NBPP 12 RGB/LUT", 1, R::kUnservedDepth, As(Layout("RGB/LUT", 12, {rgbLut})), "packed"},
+             {"NBPP 12", 2, R::kNone, As(Layout("MONO", 12, {plain})), "packed"},
+             {"NBPP 12, a byte short", 1, R::kDataOutsideFile, As(Layout("MONO", 12, {plain})), "packed, a byte short"}}) {
+        NitfImagePlan plan = Layout("RGB", 8, kRgbBands);
         if (c.change)
             c.change(plan);
         std::string stored = c.data.empty() ? data : c.data;
@@ -301,9 +276,8 @@ TEST(Image, RefusesWhatTheFileCannotBackAndWhatIsNotServed)
         const size_t at = bytes.find(c.find);
         ASSERT_NE(at, std::string::npos) << c.what;
         std::string file = bytes.replace(at, c.find.size(), c.replace).substr(0, bytes.size() - c.cut);
-        char FL[13]; // the file header keeps matching the cut file: the image is what it refuses
-        std::snprintf(FL, sizeof FL, "%012zu", file.size());
-        LoadedImage loaded(file.replace(342, 12, FL));
+        // FL keeps matching the cut file: the image is what it refuses.
+        LoadedImage loaded(file.replace(342, 12, Digits(file.size(), 12)));
         const bool parsed = loaded.Parse();
         EXPECT_EQ(!parsed ? 0 : loaded.image.PrepareData(loaded.reader, uint32_t(stored.size())) ? 2 : 1, c.stage)
             << c.what;
@@ -331,8 +305,7 @@ TEST(Image, CompressedImagesServeOnlyRowsTheirDecoderFills)
                           Case{"C2", "MONO", 1, whole, false, false}, Case{"C8", "MONO", 1, whole, false, false},
                           Case{"C4", "MONO", 1, whole, true, false}}) {
         NitfImagePlan plan = Plan(16, 16, c.IC);
-        plan.IREP = c.IREP;
-        plan.bands.resize(c.bands);
+        plan.IREP = c.IREP, plan.bands.resize(c.bands);
         LoadedImage loaded(BuildImageFile(plan, std::string(c.data.begin(), c.data.end())));
         const std::string what = std::string(c.IC) + " " + c.IREP + " " + std::to_string(c.bands);
         ASSERT_EQ(loaded.Open(), c.served) << what;
@@ -350,7 +323,7 @@ TEST(Image, JpegBlockStreamsAsEncodersWriteThem)
     Bytes app1 = {0xFF, 0xE1, 40002 >> 8, 40002 & 0xFF, 0xFF, 0xD8};
     app1.resize(app1.size() + 40000 - 4, 'x');
     app1.insert(app1.end(), {0xFF, 0xD9});
-    enum Layout { kThumbnail, kFill, kProgressive, kRestarts, kMasked };
+    enum Stream { kThumbnail, kFill, kProgressive, kRestarts, kMasked };
     const char* const what[] = {"APP1 holding FF D9, past the 32 KiB read", "fill bytes before SOI", "progressive",
                                 "RSTn within the scan", "M3, padded, offsets out of order"};
     for (int layout = kThumbnail; layout <= kMasked; ++layout) {
@@ -423,8 +396,7 @@ TEST(Image, Jpeg2000HeadersAgreeWithTheSubheaderOrAreRefused)
              {"the last tile cut off", codestream.substr(0, codestream.size() - 40), kLastTileFails},
              {"one tile of 100000 x 100000", siz(24, huge + huge).replace(8, 8, huge + huge), kRowsFail, 100000}}) {
         NitfImagePlan plan = c.side ? Plan(c.side, c.side, "C8") : Plan(24, 32, "C8", 2, 2, 16, 16);
-        plan.NBPP = c.NBPP;
-        plan.bands.resize(c.bands);
+        plan.NBPP = c.NBPP, plan.bands.resize(c.bands);
         LoadedImage loaded(BuildImageFile(plan, c.data));
         ASSERT_EQ(loaded.Open(), c.outcome != kRefused) << c.what;
         for (uint32_t row = 0; c.outcome != kRefused && row < 24; ++row) {
@@ -538,12 +510,11 @@ TEST(Corpus, ServedFilesDrawAsGdalDecodesThemAndTheRestAreRefused)
     // Files that exercise what this library must serve: padded subheaders (rgb.ntf), band-sequential blocks
     // (i_3301a), every IMODE, wide MONO, downgrade events (U_1125C), bi-level (1-D and 2-D) and JPEG blocks,
     // fill bytes before SOI (i_3025b).
-    for (const char* name : {"other/rgb.ntf", "jitc-nitf21/i_3301a.ntf", "jitc-nitf21/i_3301h.ntf",
+    for (const char* name : {"other/rgb.ntf", "jitc-nitf21/i_3301a.ntf", "jitc-nitf21/i_3301h.ntf", "other/WithBE.ntf",
                              "jitc-nitf20/U_3010A.NTF", "jitc-nitf21/i_3201c.ntf", "jitc-nitf21/i_3405a.ntf",
                              "jitc-nitf20/U_1125C.NTF", "jitc-nitf21/i_3041a.ntf", "jitc-nitf20/U_1036A.NTF",
                              "jitc-nitf21/i_3309a.ntf", "jitc-nitf21/i_3008a.ntf", "jitc-nitf21/i_3015a.ntf",
-                             "jitc-nitf21/i_3018a.ntf", "other/WithBE.ntf", "jitc-nitf20/U_2001A.NTF",
-                             "jitc-nitf21/i_3025b.ntf"})
+                             "jitc-nitf21/i_3018a.ntf", "jitc-nitf20/U_2001A.NTF", "jitc-nitf21/i_3025b.ntf"})
         EXPECT_EQ(outcomes[name].rfind("served", 0), 0u) << name;
     // NSIF, MULTI bands, wide RGB, lookup tables (in band 2 of LUinBand2): drawn as GDAL draws them, GDAL's palette.
     for (const char* name : {"jitc-nitf21/i_3034c.ntf", "jitc-nitf21/i_3034f.ntf", "jitc-nitf21/ns3034d.nsf",
