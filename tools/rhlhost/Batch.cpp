@@ -59,8 +59,11 @@ private:
         if (rh_.isFormat(file.path.c_str()) != 1) {
             if (!Exists(file.path))
                 return Vanished(file);
-            if (!file.named)
+            if (!file.named) {
+                if (options_.verbose)
+                    progress_.Report(file.path + ": not a file this handler reads (left out)");
                 return {FileResult::NotRecognised, 0};
+            }
             progress_.Report(file.path + ": the handler does not recognise it (nitfinfo says why)");
             return {FileResult::NamedNotRecognised, 0};
         }
@@ -123,6 +126,7 @@ BatchOptions BatchOptionsFrom(const CommandLine& line)
     options.extension = "." + line.format;
     options.jobs = line.jobs;
     options.render = {line.window, line.overviews, line.worldFile};
+    options.verbose = line.verbose;
     return options;
 }
 

@@ -17,6 +17,7 @@ struct BatchOptions {
     std::string extension = ".tif";
     unsigned jobs = 1;
     RenderOptions render;
+    bool verbose = false; // name the files found in folders that the handler does not recognise
 };
 
 BatchOptions BatchOptionsFrom(const CommandLine& line);

@@ -31,6 +31,10 @@ bool ApplyOption(const std::vector<std::string>& args, size_t& i, CommandLine& l
         line.worldFile = true;
         return true;
     }
+    if (name == "-v" || name == "--verbose") {
+        line.verbose = true;
+        return true;
+    }
     if (i + 1 >= args.size()) {
         message = name + " needs a value";
         return false;
@@ -65,7 +69,7 @@ bool Applies(const std::string& command, const std::string& option, bool batch, 
         return option == "--window";
     if (command == "render")
         return option == "--window" || option == "-o" || option == "--no-overviews" || option == "--world-file" ||
-               (batch && (option == "--jobs" || option == "--format"));
+               (batch && (option == "--jobs" || option == "--format" || option == "-v" || option == "--verbose"));
     if (command == "mosaic")
         return option == "-o" || option == "--no-overviews" || option == "--toc" || (toc && option == "--product");
     return false;

@@ -19,6 +19,7 @@ struct CommandLine {
     unsigned product = 0;        // --product N: its boundary rectangle, from 1
     bool overviews = true;       // --no-overviews clears it
     bool worldFile = false;      // --world-file
+    bool verbose = false;        // -v, --verbose: a batch names every file it leaves out
 };
 
 // The options of command, each "--name value" or "--name=value". False with

@@ -6,7 +6,7 @@
 //   rhlhost [--handler PATH] info FILE [--text]
 //   rhlhost [--handler PATH] dump FILE OUT.raw [--window X0,Y0,X1,Y1]
 //   rhlhost [--handler PATH] render FILE OUT.tif|OUT.png [--window X0,Y0,X1,Y1] [--no-overviews|--world-file]
-//   rhlhost [--handler PATH] render [--jobs N] [--format tif|png] [--window X0,Y0,X1,Y1] -o OUTDIR FILE_OR_DIR...
+//   rhlhost [--handler PATH] render [--jobs N] [--format tif|png] [--window X0,Y0,X1,Y1] [-v] -o OUTDIR FILE_OR_DIR...
 //   rhlhost [--handler PATH] mosaic [--no-overviews] -o OUT.tif FILE_OR_DIR...
 //   rhlhost [--handler PATH] mosaic [--no-overviews] -o OUT.tif --toc A.TOC --product N
 //   rhlhost toc A.TOC
@@ -39,7 +39,7 @@ constexpr const char* kUsage =
     "  info FILE [--text]\n"
     "  dump FILE OUT.raw [--window X0,Y0,X1,Y1]\n"
     "  render FILE OUT.tif|OUT.png [--window X0,Y0,X1,Y1] [--no-overviews|--world-file]\n"
-    "  render [--jobs N] [--format tif|png] [--window X0,Y0,X1,Y1] [--no-overviews|--world-file] -o OUTDIR FILE_OR_DIR...\n"
+    "  render [--jobs N] [--format tif|png] [--window X0,Y0,X1,Y1] [--no-overviews|--world-file] [-v] -o OUTDIR FILE_OR_DIR...\n"
     "  mosaic [--no-overviews] -o OUT.tif FILE_OR_DIR...\n"
     "  mosaic [--no-overviews] -o OUT.tif --toc A.TOC --product N\n"
     "  toc A.TOC\n"
