@@ -199,7 +199,7 @@ GDALDatasetH MakeGreyPicture(int side)
 {
     GDALDatasetH picture = GDALCreate(GDALGetDriverByName("MEM"), "", side, side, 1, GDT_Byte, nullptr);
     GDALRasterBandH band = GDALGetRasterBand(picture, 1);
-    std::vector<uint8_t> row(size_t(side));
+    std::vector<uint8_t> row(static_cast<size_t>(side));
     for (int y = 0; y < side; ++y) {
         for (int x = 0; x < side; ++x)
             row[size_t(x)] = uint8_t((x + y) / 64 + (Noise(x, y) & 0x07));
