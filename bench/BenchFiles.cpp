@@ -184,6 +184,31 @@ void AddCorpusFrame(const std::string& corpus, const char* name, const char* fil
         cases.push_back({name, path, false});
 }
 
+// Writes the picture as a C8 image in tiles of kBlockSize, then closes the picture.
+bool WriteJpeg2000Image(const std::string& path, GDALDatasetH picture)
+{
+    std::vector<std::string> options = BlockOptions(kBlockSize);
+    options.push_back("IC=C8");
+    const bool written = WriteNitf(path, picture, options);
+    GDALClose(picture);
+    return written;
+}
+
+// A grey picture of side x side with some texture, in memory.
+GDALDatasetH MakeGreyPicture(int side)
+{
+    GDALDatasetH picture = GDALCreate(GDALGetDriverByName("MEM"), "", side, side, 1, GDT_Byte, nullptr);
+    GDALRasterBandH band = GDALGetRasterBand(picture, 1);
+    std::vector<uint8_t> row(static_cast<size_t>(side));
+    for (int y = 0; y < side; ++y) {
+        for (int x = 0; x < side; ++x)
+            row[size_t(x)] = uint8_t((x + y) / 64 + (Noise(x, y) & 0x07));
+        if (GDALRasterIO(band, GF_Write, 0, y, side, 1, row.data(), side, 1, GDT_Byte, 0, 0) != CE_None)
+            break;
+    }
+    return picture;
+}
+
 constexpr int32_t kSparseSide = 73000;
 constexpr int32_t kSparseBlockSide = 8192;
 constexpr size_t kFlOffset = 342, kLiOffset = 369; // FL (12 digits) and LI (10) of a NITF 2.1 file
@@ -262,6 +287,9 @@ std::vector<LargeCase> PrepareLargeCases(const std::string& dataDir)
         if (Exists(path) || WriteRepeatedJpeg(path, side, blockSide))
             cases.push_back({name, path, true, blockSide});
     }
+    const std::string jpeg2000 = dataDir + "/jpeg2000-32768.ntf";
+    if (Exists(jpeg2000) || WriteJpeg2000Image(jpeg2000, MakeGreyPicture(32768)))
+        cases.push_back({"jpeg2000-32768", jpeg2000, false, 0});
     return cases;
 }
 
@@ -291,6 +319,10 @@ std::vector<BenchCase> PrepareCases(const std::string& dataDir, const std::strin
         if (Exists(path) || WriteJpegImage(path, kImageSize, blockSize))
             cases.push_back({name, path, true});
     }
+    // JPEG 2000 as GDAL writes it (OpenJPEG, tiles of 1024): GDAL decodes it with the same library.
+    const std::string jpeg2000 = dataDir + "/jpeg2000-c8.ntf";
+    if (Exists(jpeg2000) || WriteJpeg2000Image(jpeg2000, MakePicture(kImageSize)))
+        cases.push_back({"jpeg2000-c8", jpeg2000, false});
     const std::string biLevel = dataDir + "/bilevel-c1.ntf";
     if (Exists(biLevel) || WriteBiLevel(biLevel))
         cases.push_back({"bilevel-c1", biLevel, false});

@@ -18,13 +18,14 @@ struct BenchCase {
 std::vector<BenchCase> PrepareCases(const std::string& dataDir, const std::string& corpusDir);
 
 // Real-sized images, written once: a sparse uncompressed MONO image of about
-// 5 GiB (73,000 x 73,000) and JPEG images of 32768 x 32768 in 512 x 512 blocks
-// and 65536 x 65536 in 1024 x 1024 blocks, whose blocks repeat a few streams.
+// 5 GiB (73,000 x 73,000), JPEG images of 32768 x 32768 in 512 x 512 blocks
+// and 65536 x 65536 in 1024 x 1024 blocks, whose blocks repeat a few streams,
+// and a 32768 x 32768 grey JPEG 2000 image in tiles of 1024.
 struct LargeCase {
     std::string name;
     std::string path;
     bool jpeg = false;
-    int blockSide = 0;
+    int blockSide = 0; // 0: JPEG 2000, whose tiling the codestream gives
 };
 std::vector<LargeCase> PrepareLargeCases(const std::string& dataDir);
 
