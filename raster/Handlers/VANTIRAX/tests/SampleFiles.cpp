@@ -7,12 +7,8 @@
 #include "tests/fixtures/RpfFrameWriter.h"
 
 #include <fcntl.h>
-#include <malloc.h>
-#include <unistd.h>
 #include <map>
-
-// Defined by the sanitizer runtimes only (gcc ships no header for it).
-extern "C" size_t __sanitizer_get_current_allocated_bytes() __attribute__((weak));
+#include <unistd.h>
 
 namespace {
 
@@ -193,47 +189,39 @@ std::string OpenDrawClose(const HandlerExports& rh, const std::string& path, uin
 {
     OpenedImage image(rh, path);
     const RHHandle& h = image.handle;
-    std::vector<uint8_t> pixels;
-    uint32_t failedRows = 0;
-    if (image.Ready() && !image.Draw(0, 0, int32_t(h.width), int32_t(std::min(h.height, maxRows)), pixels, failedRows))
-        failedRows = UINT32_MAX;
-    std::string drawn = "result " + std::to_string(image.result) + " status " + std::to_string(h.status) + " failed " +
-        std::to_string(failedRows) + " size " + std::to_string(h.width) + " x " + std::to_string(h.height) + " kind " +
-        std::to_string(h.pixelKind) + "\n";
+    if (image.Ready() && !image.Draw(0, 0, int32_t(h.width), int32_t(std::min(h.height, maxRows))))
+        image.failedRows = UINT32_MAX;
+    std::string drawn = "result " + std::to_string(image.result) + " status " + std::to_string(h.status) +
+        " failed " + std::to_string(image.failedRows) + " size " + std::to_string(h.width) + " x " +
+        std::to_string(h.height) + " kind " + std::to_string(h.pixelKind) + "\n";
     if (h.palette != nullptr)
         drawn.append(reinterpret_cast<const char*>(h.palette->entries), size_t(h.palette->entryCount) * 3);
-    return drawn.append(pixels.begin(), pixels.end());
+    return drawn.append(image.pixels.begin(), image.pixels.end());
 }
 
 uint8_t LargeImagePixel(int32_t row, int32_t column)
 {
-    return uint8_t(row * 7 + column);
+    return row >= kLargeImageRows - 2 ? uint8_t(row * 7 + column) : 0;
 }
 
 bool WriteSparseLargeImage(const std::string& path)
 {
     constexpr size_t kFlOffset = 342, kLiOffset = 369; // FL (12 digits) and LI (10) of a NITF 2.1 file
+    constexpr int32_t kSide = kLargeImageSide, kRows = kLargeImageRows;
     NitfImagePlan plan;
-    plan.rows = kLargeImageRows;
-    plan.columns = plan.NPPBH = plan.NPPBV = kLargeImageSide;
-    plan.NBPC = kLargeImageRows / kLargeImageSide;
-    std::string header = BuildImageFile(plan, "");
-    const uint64_t dataBytes = uint64_t(kLargeImageSide) * uint64_t(kLargeImageRows);
+    plan.rows = kRows;
+    plan.columns = plan.NPPBH = plan.NPPBV = kSide;
+    plan.NBPC = kRows / kSide;
+    std::string header = BuildImageFile(plan, ""), lastRows;
+    const uint64_t dataBytes = uint64_t(kSide) * uint64_t(kRows);
     header.replace(kFlOffset, 12, Digits(header.size() + dataBytes, 12));
     header.replace(kLiOffset, 10, Digits(dataBytes, 10));
-    std::string lastRows;
-    for (int32_t row = kLargeImageRows - 2; row < kLargeImageRows; ++row)
-        for (int32_t column = 0; column < kLargeImageSide; ++column)
-            lastRows.push_back(char(LargeImagePixel(row, column)));
+    for (int32_t at = 0; at < 2 * kSide; ++at)
+        lastRows.push_back(char(LargeImagePixel(kRows - 2 + at / kSide, at % kSide)));
     const int file = ::open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
     const off_t end = off_t(header.size() + dataBytes);
     const bool written = file >= 0 && ::pwrite(file, header.data(), header.size(), 0) == ssize_t(header.size()) &&
                          ::pwrite(file, lastRows.data(), lastRows.size(), end - off_t(lastRows.size())) ==
                              ssize_t(lastRows.size());
     return (file < 0 || ::close(file) == 0) && written;
-}
-
-size_t HeapInUse()
-{
-    return __sanitizer_get_current_allocated_bytes ? __sanitizer_get_current_allocated_bytes() : mallinfo2().uordblks;
 }

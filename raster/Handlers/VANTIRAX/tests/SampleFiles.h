@@ -1,7 +1,6 @@
-// Small files of every kind the handler serves, built by the fixture writers,
-// for the outcome table, the handle and thread tests, the host's tests, the
-// Windows comparison and the fuzz seeds; hostile files; and what one open,
-// draw and close of a file gives.
+// Small files of every kind the handler serves, built by the fixture writers, for the outcome table, the
+// handle and thread tests, the host's tests, the Windows comparison and the fuzz seeds; hostile files; and
+// what one open, draw and close of a file gives.
 #pragma once
 
 #include "tests/fixtures/HandlerLoader.h"
@@ -25,12 +24,9 @@ const std::string& SampleBytes(const std::string& name);
 std::string OpenDrawClose(const HandlerExports& rh, const std::string& path, uint32_t maxRows);
 // How it begins for a file that opens and draws every row.
 constexpr char kDrawnClean[] = "result 1 status 0 failed 0 ";
-// A sparse NITF 2.1 file of 4.7 GB: one column of kLargeImageSide-square MONO
-// blocks, holes but for its last two rows, which hold LargeImagePixel. False
-// when it cannot be written.
+// A sparse NITF 2.1 file of 4.7 GB: one column of kLargeImageSide-square MONO blocks, holes (pixel 0) but for
+// its last two rows, which hold LargeImagePixel. False when it cannot be written.
 constexpr int32_t kLargeImageSide = 8192;
 constexpr int32_t kLargeImageRows = kLargeImageSide * 70;
 uint8_t LargeImagePixel(int32_t row, int32_t column);
 bool WriteSparseLargeImage(const std::string& path);
-// Bytes of heap the process holds: the sanitizer's count in sanitized builds, the C library's otherwise.
-size_t HeapInUse();
