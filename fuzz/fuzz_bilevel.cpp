@@ -8,14 +8,10 @@
 #include <stdexcept>
 #include <vector>
 
-namespace {
-
 constexpr size_t kPrefixSize = 5;
 constexpr uint32_t kSideMask = 0x1FFF; // images of up to 8192 x 8192
 constexpr uint64_t kPixelBudget = 1u << 20;
 constexpr uint32_t kByteBits = 8;
-
-} // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size)
 {

@@ -16,8 +16,6 @@ int32_t RH_EndDraw(RHHandle* handle);
 int32_t RH_Close(RHHandle* handle);
 }
 
-namespace {
-
 constexpr uint64_t kPixelBudget = 1u << 18; // pixels drawn per input
 constexpr uint32_t kMaxRows = 4096;
 constexpr uint32_t kFailedOpenSide = 64; // the span drawn on a handle whose open failed
@@ -25,7 +23,7 @@ constexpr uint32_t kReverseRows = 64;
 
 // Rows firstRow, firstRow + step, ... of columns [firstColumn, endColumn),
 // while the pixel budget lasts.
-void DrawSpan(RHHandle& handle, int32_t firstColumn, int32_t endColumn, uint32_t firstRow, uint32_t height,
+static void DrawSpan(RHHandle& handle, int32_t firstColumn, int32_t endColumn, uint32_t firstRow, uint32_t height,
               int32_t step)
 {
     const int32_t rect[4] = {firstColumn, int32_t(firstRow), endColumn, int32_t(std::min<uint32_t>(height, INT32_MAX))};
@@ -49,7 +47,7 @@ void DrawSpan(RHHandle& handle, int32_t firstColumn, int32_t endColumn, uint32_t
 
 // The full width from the top, then an inner span from the bottom row up
 // (hosts ask for rows in any order), then a span that starts left of the image.
-void Draw(RHHandle& handle)
+static void Draw(RHHandle& handle)
 {
     const bool described = handle.status == kStatusOk;
     const uint32_t width = described ? handle.width : kFailedOpenSide;
@@ -63,8 +61,6 @@ void Draw(RHHandle& handle)
     if (handle.handler != nullptr)
         DrawSpan(handle, -3, std::min(end, 5), 0, 1, 1);
 }
-
-} // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size)
 {

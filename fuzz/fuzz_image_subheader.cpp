@@ -9,12 +9,10 @@
 #include <algorithm>
 #include <vector>
 
-namespace {
-
 constexpr size_t kPrefixSize = 4;
 constexpr uint64_t kPixelBudget = 1u << 18;
 
-void ReadRows(CNitfImage& image, CFileReader& reader)
+static void ReadRows(CNitfImage& image, CFileReader& reader)
 {
     if (image.NCOLS < 1 || image.NROWS < 1)
         return;
@@ -30,8 +28,6 @@ void ReadRows(CNitfImage& image, CFileReader& reader)
         image.ReadLine(reader, uint32_t(image.NROWS - 1), image.NCOLS - int32_t(width) + 1, image.NCOLS - 2,
                        row.data());
 }
-
-} // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size)
 {

@@ -10,13 +10,9 @@
 #include <stdexcept>
 #include <vector>
 
-namespace {
-
 constexpr size_t kPrefixSize = 8;
 constexpr uint32_t kBlockSideMask = 0x7FF; // blocks of up to 2048 x 2048
 constexpr uint64_t kPixelBudget = 1u << 18;
-
-} // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size)
 {

@@ -8,12 +8,8 @@
 #include <algorithm>
 #include <vector>
 
-namespace {
-
 constexpr size_t kPrefixSize = 6;
 constexpr uint64_t kPixelBudget = 1u << 20;
-
-} // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size)
 {
