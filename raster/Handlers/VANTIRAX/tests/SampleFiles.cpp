@@ -15,11 +15,6 @@ namespace {
 constexpr uint32_t kFaxWidth = 96, kFaxHeight = 48;
 const char kUtmCorners[] = "335000004000000335060004000000335060003992000335000003992000"; // zone 33 north
 
-std::string AsString(const Bytes& bytes)
-{
-    return std::string(bytes.begin(), bytes.end());
-}
-
 // 70 x 90 pixels in 3 x 3 blocks of 32, the edge blocks padded; three bands are R, G, B.
 NitfImagePlan Image(const std::string& IREP, size_t bands, char IMODE, char ICORDS = ' ', const char* IGEOLO = "")
 {
@@ -45,20 +40,11 @@ std::string Uncompressed(const NitfImagePlan& plan, unsigned seed)
     const std::vector<std::string> blocks = BuildImageBlocks(plan, [&](int32_t band, int32_t row, int32_t column) {
         return (uint64_t(band * 70 + row * 3 + column * 5) + seed * 11) * (values > 256 ? 29 : 1) % values;
     });
-    std::vector<bool> stored(blocks.size());
-    for (size_t i = 0; i < stored.size(); ++i)
-        stored[i] = i % 4 != 1;
+    std::vector<bool> stored;
+    for (size_t i = 0; i < blocks.size(); ++i)
+        stored.push_back(i % 4 != 1);
     return BuildImageFile(plan, plan.IC == "NM" ? BuildMaskedData(blocks, stored, 8) : JoinBlocks(blocks),
                           plan.downgradeEvent);
-}
-
-std::string Frame(RpfProduct product, bool bigEndian, std::set<uint32_t> masked)
-{
-    RpfFramePlan plan;
-    plan.product = product;
-    plan.bigEndian = bigEndian;
-    plan.maskedSubframes = std::move(masked);
-    return BuildRpfFrame(plan).bytes;
 }
 
 // A 32 x 32 grey or colour image of 2 x 2 blocks; streamScale > 1 makes each
@@ -81,7 +67,8 @@ std::string Jpeg(int components, unsigned seed, uint32_t streamScale = 1)
                                                           : TestPattern(16, 16, components, seed * 4 + i),
                                           block));
     }
-    return BuildImageFile(plan, AsString(BuildNitfJpegData(streams, NitfApp6Plan{2, 2, 0, uint8_t(grey ? 0 : 2)})));
+    const Bytes data = BuildNitfJpegData(streams, NitfApp6Plan{2, 2, 0, uint8_t(grey ? 0 : 2)});
+    return BuildImageFile(plan, std::string(data.begin(), data.end()));
 }
 
 // JPEG 2000 in 32 x 32 tiles, the subheader's blocks: 12-bit grey samples
@@ -105,7 +92,9 @@ std::string BiLevel(bool twoDimensional, unsigned seed)
     std::vector<uint8_t> packed(size_t(kFaxWidth / 8) * kFaxHeight);
     for (size_t i = 0; i < packed.size(); ++i)
         packed[i] = uint8_t((i * 37 + seed * 11) ^ (i / 12));
-    return BuildImageFile(BiLevelPlan(int32_t(kFaxWidth), int32_t(kFaxHeight), twoDimensional), AsString(EncodeT4Strip(packed, kFaxWidth, kFaxHeight, twoDimensional)));
+    const std::vector<uint8_t> strip = EncodeT4Strip(packed, kFaxWidth, kFaxHeight, twoDimensional);
+    return BuildImageFile(BiLevelPlan(int32_t(kFaxWidth), int32_t(kFaxHeight), twoDimensional),
+                          std::string(strip.begin(), strip.end()));
 }
 
 } // namespace
@@ -132,9 +121,9 @@ std::vector<SampleFile> FilesOfEveryKind(unsigned seed)
         {"compressed_jpeg2000_rgb_jp2", Jpeg2000(true, seed)},
         {"compressed_bilevel_1d", BiLevel(false, seed)},
         {"compressed_bilevel_2d", BiLevel(true, seed)},
-        {"cadrg_big_endian", Frame(RpfProduct::Cadrg, true, cadrgMasked)},
-        {"cadrg_little_endian", Frame(RpfProduct::Cadrg, false, cadrgMasked)},
-        {"cib", Frame(RpfProduct::Cib, true, {7})},
+        {"cadrg_big_endian", BuildRpfFrame({RpfProduct::Cadrg, true, {}, cadrgMasked, {}, {}}).bytes},
+        {"cadrg_little_endian", BuildRpfFrame({RpfProduct::Cadrg, false, {}, cadrgMasked, {}, {}}).bytes},
+        {"cib", BuildRpfFrame({RpfProduct::Cib, true, {}, {7}, {}, {}}).bytes},
         {"mono_geographic",
          Uncompressed(Image("MONO", 1, 'B', 'G', "324530N0784510W324530N0784400W324415N0784400W324415N0784510W"),
                       seed)},
@@ -150,12 +139,9 @@ std::vector<SampleFile> FilesOfEveryKind(unsigned seed)
 
 std::vector<SampleFile> HostileFiles()
 {
-    RpfFramePlan shortTable;
-    shortTable.indexImage = std::vector<uint8_t>(kRpfFrameSide * kRpfFrameSide, 3);
-    shortTable.colorTableRecords = {32};
-    NitfFilePlan noSections; // RPFHDR present, the RPF sections missing
-    noSections.images.push_back({std::string(100, 'x'), std::string(100, 'y')});
-    noSections.userHeaderData = Tre("RPFHDR", std::string(48, '\0'));
+    const RpfFramePlan shortTable{RpfProduct::Cadrg, true, Bytes(kRpfFrameSide * kRpfFrameSide, 3), {}, {}, {32}};
+    const NitfFilePlan noSections{true, false, {{std::string(100, 'x'), std::string(100, 'y')}}, {}, {}, {}, {}, {},
+                                  Tre("RPFHDR", std::string(48, '\0')), "", -1, -1}; // the RPF sections missing
     NitfImagePlan plan;
     plan.rows = plan.columns = 8;
     plan.COMRAT = "00.0";
