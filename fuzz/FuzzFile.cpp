@@ -12,9 +12,8 @@
 #include <unistd.h>
 #include <vector>
 
-// The fuzzing build reads through in-memory file calls: the input is
-// published under a fixed name; the other builds write it to a file
-// removed at exit.
+// The fuzzing build reads through in-memory file calls: the input is published under a fixed name; the other builds
+// write it to a file removed at exit.
 const std::string& FuzzFilePath()
 {
 #ifdef VX_MEMORY_FILES

@@ -1,10 +1,8 @@
-// The main of a fuzz target outside libFuzzer: replays inputs (files, or the
-// files of a folder; an absent folder holds none) under a campaign's limits,
-// given as libFuzzer takes them:
+// The main of a fuzz target outside libFuzzer: replays inputs (files, or the files of a folder; an absent folder
+// holds none) under a campaign's limits, given as libFuzzer takes them:
 //   fuzz_TARGET [-timeout=S] [-rss_limit_mb=M] [-malloc_limit_mb=M] FILE_OR_FOLDER...
-// One allocation above the malloc limit (the RSS limit when none is given), a
-// unit running past the timeout or a peak resident set above the RSS limit
-// fails the run, naming the input.
+// One allocation above the malloc limit (the RSS limit when none is given), a unit running past the timeout or a peak
+// resident set above the RSS limit fails the run, naming the input.
 #include <algorithm>
 #include <cstdint>
 #include <cstdio>

@@ -1,8 +1,7 @@
-// Writes the seed corpora of the fuzz targets into one folder per target: the
-// sample files of every kind (whole files for the export and header
-// targets), the per-parser inputs cut out of those and of the shared sample
-// files (JPEG 2000 image data among them), JPEG streams of every lossless
-// predictor and default table, and MGRS references and image corners.
+// Writes the seed corpora of the fuzz targets into one folder per target: the sample files of every kind (whole files
+// for the export and header targets), the per-parser inputs cut out of those and of the shared sample files
+// (JPEG 2000 image data among them), JPEG streams of every lossless predictor and default table, and MGRS references
+// and image corners.
 //   fuzz_seeds OUTPUT_DIR [SAMPLE_DIR...]
 #include "base/MemoryFiles.h"
 #include "nitf/NitfFileHeader.h"
@@ -40,9 +39,8 @@ std::string Prefix(std::initializer_list<std::pair<uint32_t, unsigned>> numbers)
     return prefix;
 }
 
-// One 16 x 16 block as the JPEG target reads it: lossless streams of every
-// predictor with restarts and a point transform, and baseline streams
-// without DQT and DHT that take the default tables of each quality.
+// One 16 x 16 block as the JPEG target reads it: lossless streams of every predictor with restarts and a point
+// transform, and baseline streams without DQT and DHT that take the default tables of each quality.
 void JpegStreams()
 {
     for (int components : {1, 3})

@@ -1,6 +1,5 @@
-// The bi-level (CCITT T.4) decoder on one image's data. Input: a 5-byte
-// control prefix (bytes 0-1 and 2-3: NCOLS and NROWS less one; byte 4:
-// bit 0 one-dimensional coding), then the strip.
+// The bi-level (CCITT T.4) decoder on one image's data. Input: a 5-byte control prefix (bytes 0-1 and 2-3: NCOLS and
+// NROWS less one; byte 4: bit 0 one-dimensional coding), then the strip.
 #include "FuzzFile.h"
 #include "imaging/LeadToolLibWrapper.h"
 

@@ -1,6 +1,5 @@
-// The whole export sequence on one input file, as a host drives it: probe,
-// open, one draw over the full width, every row up to a pixel budget, end of
-// draw, close. The exports are linked in, not loaded.
+// The whole export sequence on one input file, as a host drives it: probe, open, one draw over the full width, every
+// row up to a pixel budget, end of draw, close. The exports are linked in, not loaded.
 #include "FuzzFile.h"
 #include "plugin/HostRecords.h"
 
@@ -21,10 +20,9 @@ constexpr uint32_t kMaxRows = 4096;
 constexpr uint32_t kFailedOpenSide = 64; // the span drawn on a handle whose open failed
 constexpr uint32_t kReverseRows = 64;
 
-// Rows firstRow, firstRow + step, ... of columns [firstColumn, endColumn),
-// while the pixel budget lasts.
+// Rows firstRow, firstRow + step, ... of columns [firstColumn, endColumn), while the pixel budget lasts.
 static void DrawSpan(RHHandle& handle, int32_t firstColumn, int32_t endColumn, uint32_t firstRow, uint32_t height,
-              int32_t step)
+                     int32_t step)
 {
     const int32_t rect[4] = {firstColumn, int32_t(firstRow), endColumn, int32_t(std::min<uint32_t>(height, INT32_MAX))};
     uint32_t rowWidth = 0;

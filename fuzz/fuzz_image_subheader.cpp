@@ -1,8 +1,6 @@
-// The first image segment of a plain NITF file: subheader parse, data
-// preparation, decode of compressed kinds and rows up to a pixel budget.
-// Input: a 4-byte control prefix (byte 0: bit 0 NITF 2.1 layout, bit 1 not
-// used; bytes 1-3: LISH, 0 when not known), then the
-// subheader and its image data as they stand in the file.
+// The first image segment of a plain NITF file: subheader parse, data preparation, decode of compressed kinds and
+// rows up to a pixel budget. Input: a 4-byte control prefix (byte 0: bit 0 NITF 2.1 layout, bit 1 not used; bytes
+// 1-3: LISH, 0 when not known), then the subheader and its image data as they stand in the file.
 #include "FuzzFile.h"
 #include "nitf/NitfImage.h"
 

@@ -1,8 +1,7 @@
-// The NITF JPEG decoder on one image's data. Input: an 8-byte control prefix
-// (byte 0: bit 0 three bands; byte 1: bit 0 two blocks per row, bit 1 two
-// per column; bytes 2-3 and 4-5: NPPBH and NPPBV less one; byte 6: bit 0
-// pass the block size, bit 1 the IC "C5" lossless kind, no other
-// difference here), then the image data: one JPEG stream per block.
+// The NITF JPEG decoder on one image's data. Input: an 8-byte control prefix (byte 0: bit 0 three bands; byte 1: bit
+// 0 two blocks per row, bit 1 two per column; bytes 2-3 and 4-5: NPPBH and NPPBV less one; byte 6: bit 0 pass the
+// block size, bit 1 the IC "C5" lossless kind, no other difference here), then the image data: one JPEG stream per
+// block.
 #include "FuzzFile.h"
 #include "imaging/LeadToolLibWrapper.h"
 

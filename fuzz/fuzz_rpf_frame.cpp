@@ -1,6 +1,5 @@
-// The RPF frame reader on one input file: open at the RPFHDR data (found by
-// its tag, else at offset 0), then a full-width draw over a sample of rows
-// and a narrow draw inside the frame.
+// The RPF frame reader on one input file: open at the RPFHDR data (found by its tag, else at offset 0), then a
+// full-width draw over a sample of rows and a narrow draw inside the frame.
 #include "FuzzFile.h"
 #include "rpf/RpfFrameReader.h"
 

@@ -1,6 +1,5 @@
-// What a host meets through the loaded handler: every kind of file probed,
-// opened and drawn, judged by GDAL; every file of the shared corpus; handles'
-// descriptors and heap; images beyond the decoded-block bound.
+// What a host meets through the loaded handler: every kind of file probed, opened and drawn, judged by GDAL; every
+// file of the shared corpus; handles' descriptors and heap; images beyond the decoded-block bound.
 #include "tests/GdalPeer.h"
 #include "tests/SampleFiles.h"
 #include "base/Limits.h"

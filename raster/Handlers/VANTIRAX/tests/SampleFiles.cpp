@@ -47,9 +47,8 @@ std::string Uncompressed(const NitfImagePlan& plan, unsigned seed)
                           plan.downgradeEvent);
 }
 
-// A 32 x 32 grey or colour image of 2 x 2 blocks; streamScale > 1 makes each
-// stream that many times larger than its block, the lower two progressive
-// (their coefficient buffers are as large as the frame).
+// A 32 x 32 grey or colour image of 2 x 2 blocks; streamScale > 1 makes each stream that many times larger than its
+// block, the lower two progressive (their coefficient buffers are as large as the frame).
 std::string Jpeg(int components, unsigned seed, uint32_t streamScale = 1)
 {
     const bool grey = components == 1;

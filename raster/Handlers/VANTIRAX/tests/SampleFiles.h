@@ -9,18 +9,16 @@ struct SampleFile {
     std::string name, bytes;
 };
 
-// RPF frames of both products and byte orders, uncompressed NITF 2.1 and 2.0
-// images in every IMODE and corner form, a lookup table, wide samples, masked
-// blocks, JPEG and bi-level images. Compressed kinds first: the first open of
-// such a file binds the imaging library. Files of other seeds differ in pixels.
+// RPF frames of both products and byte orders, uncompressed NITF 2.1 and 2.0 images in every IMODE and corner form, a
+// lookup table, wide samples, masked blocks, JPEG and bi-level images. Compressed kinds first: the first open of such
+// a file binds the imaging library. Files of other seeds differ in pixels.
 std::vector<SampleFile> FilesOfEveryKind(unsigned seed = 0);
 // Files that are refused at open, or (the last) open with rows that fail.
 std::vector<SampleFile> HostileFiles();
 // The bytes of the file of either list with this name.
 const std::string& SampleBytes(const std::string& name);
-// One open, draw of full-width rows [0, maxRows) and close, as a line
-// "result R status S failed F size W x H kind K" (failed 0 when not drawn),
-// then the palette's bytes and the rows'.
+// One open, draw of full-width rows [0, maxRows) and close, as a line "result R status S failed F size W x H kind K"
+// (failed 0 when not drawn), then the palette's bytes and the rows'.
 std::string OpenDrawClose(const HandlerExports& rh, const std::string& path, uint32_t maxRows);
 // How it begins for a file that opens and draws every row.
 constexpr char kDrawnClean[] = "result 1 status 0 failed 0 ";

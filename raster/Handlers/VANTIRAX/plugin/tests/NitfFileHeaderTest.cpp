@@ -103,9 +103,8 @@ TEST(NitfFileHeader, RefusesWrongVersionsAndLengthsThatLie)
     const std::string good = declaring(-1, -1), rest = good.substr(9);
     const Refusal kVersion = Refusal::kNotNitf, kLength = Refusal::kFileLengthMismatch,
                   kField = Refusal::kHeaderFieldInvalid;
-    // Other versions; FL larger or smaller than the file; a segment count running past the end
-    // of the file whose FL still matches, or not a number; UDHDL of 1 or 2 (a negative data
-    // size) or past the end of the file; XHDL 2.
+    // Other versions; FL larger or smaller than the file; a segment count running past the end of the file whose FL
+    // still matches, or not a number; UDHDL of 1 or 2 (a negative data size) or past the end of the file; XHDL 2.
     for (const auto& [bad, why] : std::initializer_list<std::pair<std::string, Refusal>>{
              {"NITF02.01" + rest, kVersion}, {"NITF01.10" + rest, kVersion}, {"NSIF01.01" + rest, kVersion},
              {"NITF03.00" + rest, kVersion}, {good.substr(0, good.size() - 1), kLength}, {good + "x", kLength},
