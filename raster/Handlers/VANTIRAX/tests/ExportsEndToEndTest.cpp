@@ -243,7 +243,7 @@ TEST(MemoryLimits, ImagesBeyondTheCapsOpenSmallAndDrawWithinTheBound)
     plan.rows = plan.columns = kSide;
     plan.IC = "C3";
     plan.COMRAT = "00.0";
-    struct Case { std::string bytes; uint32_t columns; size_t openGrowth; int32_t row, drawn; bool fails; uint8_t value; };
+    struct Case { std::string bytes; uint32_t columns; size_t opening; int32_t row, drawn; bool fails; uint8_t value; };
     std::vector<Case> cases = {{BuildImageFile(plan, std::string(jpeg.begin(), jpeg.end())), kSide, 1u << 20,
                                 kSide - 1, kSide, false, 90}};
     for (const auto& [columns, rows, twoDimensional, decodes] :
@@ -262,7 +262,7 @@ TEST(MemoryLimits, ImagesBeyondTheCapsOpenSmallAndDrawWithinTheBound)
         OpenedImage image(LoadHandler(VX_HANDLER_PATH), file.path());
         ASSERT_TRUE(image.Ready());
         EXPECT_EQ(image.handle.width, c.columns);
-        EXPECT_LT(HeapInUse(), before + c.openGrowth);
+        EXPECT_LT(HeapInUse(), before + c.opening);
         ASSERT_TRUE(image.Draw(0, c.row, c.drawn, c.row + 1));
         EXPECT_EQ(image.failedRows, c.fails ? 1u : 0u);
         EXPECT_EQ(image.pixels, std::vector<uint8_t>(size_t(c.drawn), c.value));

@@ -18,18 +18,10 @@ const char kUtmCorners[] = "3350000040000003350600040000003350600039920003350000
 // 70 x 90 pixels in 3 x 3 blocks of 32, the edge blocks padded; three bands are R, G, B.
 NitfImagePlan Image(const std::string& IREP, size_t bands, char IMODE, char ICORDS = ' ', const char* IGEOLO = "")
 {
-    NitfImagePlan plan;
-    plan.rows = 70;
-    plan.columns = 90;
-    plan.IREP = IREP;
-    plan.IMODE = IMODE;
-    plan.ICORDS = ICORDS;
-    plan.IGEOLO = IGEOLO;
-    plan.bands.assign(bands, NitfBandPlan{});
+    NitfImagePlan plan{true, false, 70, 90, "INT", IREP, 0, 'R', ICORDS, IGEOLO, {}, "NC", "",
+                       std::vector<NitfBandPlan>(bands), false, IMODE, 3, 3, 32, 32, 8, "", "", ""};
     for (size_t band = 0; bands == 3 && band < 3; ++band)
         plan.bands[band].IREPBAND = std::string(1, "RGB"[band]);
-    plan.NBPR = plan.NBPC = 3;
-    plan.NPPBH = plan.NPPBV = 32;
     return plan;
 }
 

@@ -14,12 +14,7 @@ namespace {
 const HandlerExports& rh = LoadHandler(VX_HANDLER_PATH);
 constexpr uint32_t kHostStatus = 77; // a value the library never writes
 
-RHHandle FreshHandle()
-{
-    RHHandle handle{};
-    handle.status = kHostStatus;
-    return handle;
-}
+const auto FreshHandle = [] { RHHandle handle{}; handle.status = kHostStatus; return handle; };
 
 // The names and the extension list are compared by HostCommandsTest ("identify").
 TEST(Exports, IdentityRecordIsCopiedWhole)
