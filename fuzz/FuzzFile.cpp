@@ -24,8 +24,7 @@ const std::string& FuzzFilePath()
         std::string path = std::string(std::getenv("TMPDIR") ? std::getenv("TMPDIR") : "/tmp") + "/vx_fuzz_XXXXXX";
         File()
         {
-            const int descriptor = mkstemp(path.data());
-            if (descriptor < 0 || close(descriptor) != 0)
+            if (close(mkstemp(path.data())) != 0) // as when mkstemp fails: close(-1)
                 std::abort();
         }
         ~File() { unlink(path.c_str()); }

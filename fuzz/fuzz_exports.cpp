@@ -16,9 +16,8 @@ int32_t RH_Close(RHHandle* handle);
 }
 
 constexpr uint64_t kPixelBudget = 1u << 18; // pixels drawn per input
-constexpr uint32_t kMaxRows = 4096;
+constexpr uint32_t kMaxRows = 4096, kReverseRows = 64;
 constexpr uint32_t kFailedOpenSide = 64; // the span drawn on a handle whose open failed
-constexpr uint32_t kReverseRows = 64;
 
 // Rows firstRow, firstRow + step, ... of columns [firstColumn, endColumn), while the pixel budget lasts.
 static void DrawSpan(RHHandle& handle, int32_t firstColumn, int32_t endColumn, uint32_t firstRow, uint32_t height,
@@ -71,10 +70,9 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size)
     RH_Open(&handle, path);
     if (handle.handler == nullptr)
         return 0;
-    if (handle.palette != nullptr && handle.palette->entryCount > 0) {
-        volatile uint8_t last = handle.palette->entries[size_t(handle.palette->entryCount) * 3 - 1];
-        (void)last;
-    }
+    volatile uint8_t last = 0; // the whole palette must be addressable
+    if (handle.palette != nullptr && handle.palette->entryCount > 0)
+        last = last ^ handle.palette->entries[size_t(handle.palette->entryCount) * 3 - 1];
     // A host may draw a handle whose open failed but left the handler attached (status 5): that must fail cleanly too.
     Draw(handle);
     RH_Close(&handle);

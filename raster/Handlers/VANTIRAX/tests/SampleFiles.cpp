@@ -143,12 +143,10 @@ std::vector<SampleFile> HostileFiles()
     const std::string dpcm = withIC("C2", 64), jpeg2000 = withIC("C8", 64), cut = withIC("NC", 64).substr(0, 300);
     plan.PVTYPE = "R";
     plan.NBPP = 32;
+    // dpcm parses but is never served; jpeg2000 parses but holds no codestream.
     return {{"rpf_short_colour_table", BuildRpfFrame(shortTable).bytes},
-            {"rpf_sections_missing", BuildNitfFile(noSections)},
-            {"dpcm", dpcm}, // parses, never served
-            {"jpeg2000", jpeg2000}, // parses; no codestream
-            {"real_pixels", withIC("NC", 256)},
-            {"cut_header", cut},
+            {"rpf_sections_missing", BuildNitfFile(noSections)}, {"dpcm", dpcm}, {"jpeg2000", jpeg2000},
+            {"real_pixels", withIC("NC", 256)}, {"cut_header", cut},
             {"jpeg_streams_larger_than_blocks", Jpeg(1, 0, 16)}};
 }
 

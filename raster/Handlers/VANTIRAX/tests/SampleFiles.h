@@ -5,9 +5,7 @@
 
 #include "tests/fixtures/HandlerLoader.h"
 
-struct SampleFile {
-    std::string name, bytes;
-};
+struct SampleFile { std::string name, bytes; };
 
 // RPF frames of both products and byte orders, uncompressed NITF 2.1 and 2.0 images in every IMODE and corner form, a
 // lookup table, wide samples, masked blocks, JPEG and bi-level images. Compressed kinds first: the first open of such
@@ -24,7 +22,6 @@ std::string OpenDrawClose(const HandlerExports& rh, const std::string& path, uin
 constexpr char kDrawnClean[] = "result 1 status 0 failed 0 ";
 // A sparse NITF 2.1 file of 4.7 GB: one column of kLargeImageSide-square MONO blocks, holes (pixel 0) but for
 // its last two rows, which hold LargeImagePixel. False when it cannot be written.
-constexpr int32_t kLargeImageSide = 8192;
-constexpr int32_t kLargeImageRows = kLargeImageSide * 70;
+constexpr int32_t kLargeImageSide = 8192, kLargeImageRows = kLargeImageSide * 70;
 uint8_t LargeImagePixel(int32_t row, int32_t column);
 bool WriteSparseLargeImage(const std::string& path);

@@ -86,8 +86,7 @@ TEST(ImageCorners, EachFormGivesItsCornersAndCodeAndNoneIsReadPastIgeolo)
     }
     // Without IGEOLO nothing is written; a short one is not read past its end (exactly sized
     // heap copies: a read past the terminator trips the address sanitizer).
-    EXPECT_EQ(Read(ImageCornerFields{'G', nullptr, true}), kUnwritten);
-    EXPECT_EQ(ImageCornerEpsgCode(ImageCornerFields{'G', nullptr, true}, 4326), 0);
+    EXPECT_TRUE(Read({'G', nullptr, true}) == kUnwritten && ImageCornerEpsgCode({'G', nullptr, true}, 4326) == 0);
     for (char icords : {'G', 'D', 'N', 'U'}) {
         const std::unique_ptr<char[]> igeolo(std::strcpy(new char[11], "4531311836"));
         EXPECT_EQ(Read(ImageCornerFields{icords, igeolo.get(), true})[5], 0.0) << icords;
