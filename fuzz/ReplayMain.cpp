@@ -1,10 +1,8 @@
-// The main of a fuzz target outside libFuzzer: replays inputs (files, or the
-// files of a folder; an absent folder holds none) under a campaign's limits,
-// given as libFuzzer takes them:
+// The main of a fuzz target outside libFuzzer: replays inputs (files, or the files of a folder; an absent folder
+// holds none) under a campaign's limits, given as libFuzzer takes them:
 //   fuzz_TARGET [-timeout=S] [-rss_limit_mb=M] [-malloc_limit_mb=M] FILE_OR_FOLDER...
-// One allocation above the malloc limit (the RSS limit when none is given), a
-// unit running past the timeout or a peak resident set above the RSS limit
-// fails the run, naming the input.
+// One allocation above the malloc limit (the RSS limit when none is given), a unit running past the timeout or a peak
+// resident set above the RSS limit fails the run, naming the input.
 #include <algorithm>
 #include <cstdint>
 #include <cstdio>
@@ -61,19 +59,16 @@ void* __libc_calloc(size_t, size_t);
 void* __libc_realloc(void*, size_t);
 __attribute__((visibility("default"))) void* malloc(size_t size) noexcept
 {
-    CheckAllocation(size);
-    return __libc_malloc(size);
+    return CheckAllocation(size), __libc_malloc(size);
 }
 __attribute__((visibility("default"))) void* calloc(size_t count, size_t size) noexcept
 {
     size_t total = SIZE_MAX;
-    CheckAllocation(__builtin_mul_overflow(count, size, &total) ? SIZE_MAX : total);
-    return __libc_calloc(count, size);
+    return CheckAllocation(__builtin_mul_overflow(count, size, &total) ? SIZE_MAX : total), __libc_calloc(count, size);
 }
 __attribute__((visibility("default"))) void* realloc(void* block, size_t size) noexcept
 {
-    CheckAllocation(size);
-    return __libc_realloc(block, size);
+    return CheckAllocation(size), __libc_realloc(block, size);
 }
 }
 #endif
@@ -87,10 +82,8 @@ int main(int argc, char** argv)
             std::sscanf(argv[i], "-rss_limit_mb=%lu", &rssLimitMb) == 1 ||
             std::sscanf(argv[i], "-malloc_limit_mb=%lu", &mallocLimitMb) == 1)
             continue;
-        if (argv[i][0] == '-') {
-            std::fprintf(stderr, "%s: unknown option %s\n", argv[0], argv[i]);
-            return 2;
-        }
+        if (argv[i][0] == '-')
+            return std::fprintf(stderr, "%s: unknown option %s\n", argv[0], argv[i]), 2;
         const size_t first = inputs.size();
         if (fs::is_directory(argv[i]))
             std::copy(fs::directory_iterator(argv[i]), fs::directory_iterator(), std::back_inserter(inputs));
@@ -110,8 +103,8 @@ int main(int argc, char** argv)
         alarm(0);
         mallocLimit = 0;
         struct rusage usage { };
-        getrusage(RUSAGE_SELF, &usage);
-        if (rssLimitMb != 0 && static_cast<unsigned long>(usage.ru_maxrss) > rssLimitMb << 10)
+        if (getrusage(RUSAGE_SELF, &usage) == 0 && rssLimitMb != 0 &&
+            static_cast<unsigned long>(usage.ru_maxrss) > rssLimitMb << 10)
             Fail("out-of-memory: peak resident set (kB)", static_cast<unsigned long long>(usage.ru_maxrss));
     }
     std::printf("%zu inputs replayed\n", inputs.size());

@@ -1,8 +1,7 @@
-// Writes the seed corpora of the fuzz targets into one folder per target: the
-// sample files of every kind (whole files for the export and header
-// targets), the per-parser inputs cut out of those and of the shared sample
-// files (JPEG 2000 image data among them), JPEG streams of every lossless
-// predictor and default table, and MGRS references and image corners.
+// Writes the seed corpora of the fuzz targets into one folder per target: the sample files of every kind (whole files
+// for the export and header targets), the per-parser inputs cut out of those and of the shared sample files
+// (JPEG 2000 image data among them), JPEG streams of every lossless predictor and default table, and MGRS references
+// and image corners.
 //   fuzz_seeds OUTPUT_DIR [SAMPLE_DIR...]
 #include "base/MemoryFiles.h"
 #include "nitf/NitfFileHeader.h"
@@ -40,20 +39,15 @@ std::string Prefix(std::initializer_list<std::pair<uint32_t, unsigned>> numbers)
     return prefix;
 }
 
-// One 16 x 16 block as the JPEG target reads it: lossless streams of every
-// predictor with restarts and a point transform, and baseline streams
-// without DQT and DHT that take the default tables of each quality.
+// One 16 x 16 block as the JPEG target reads it: lossless streams of every predictor with restarts and a point
+// transform, and baseline streams without DQT and DHT that take the default tables of each quality.
 void JpegStreams()
 {
     for (int components : {1, 3})
-        for (int n = 1; n <= 7; ++n) {
-            JpegBlockPlan lossless{16, 16, components};
-            lossless.predictor = n;
-            lossless.pointTransform = n % 3;
-            lossless.restartRows = n % 2 ? 4u : 0u;
-            JpegBlockPlan baseline{16, 16, components};
-            baseline.defaultQuality = n <= 5 ? n : 0;
-            baseline.keepDqt = baseline.keepDht = n > 5;
+        for (int n = 1; n <= 7; ++n) { // lossless: predictor n, point transform n % 3; baseline: quality n
+            const JpegBlockPlan lossless{16, 16, components, false, 0, true, true, true, false, false, n, n % 3,
+                                         n % 2 ? 4u : 0u};
+            const JpegBlockPlan baseline{16, 16, components, false, n <= 5 ? n : 0, n > 5, n > 5};
             const Bytes pattern = TestPattern(16, 16, components, unsigned(n));
             for (const Bytes& stream : {EncodeJpegBlock(pattern, lossless), EncodeJpegBlock(pattern, baseline)}) {
                 const Bytes data = BuildNitfJpegData({stream}, NitfApp6Plan{});
@@ -120,25 +114,20 @@ void MgrsReferences()
 
 int main(int argc, char** argv)
 {
-    if (argc < 2) {
-        std::fprintf(stderr, "usage: %s OUTPUT_DIR [SAMPLE_DIR...]\n", argv[0]);
-        return 2;
-    }
+    if (argc < 2)
+        return std::fprintf(stderr, "usage: %s OUTPUT_DIR [SAMPLE_DIR...]\n", argv[0]), 2;
     root = argv[1];
     for (const auto& files : {FilesOfEveryKind(), HostileFiles()})
         for (const SampleFile& file : files)
             Write("exports", file.name + ".ntf", file.bytes);
     JpegStreams();
     MgrsReferences();
-    std::vector<fs::path> wholeFiles;
     for (const fs::directory_entry& entry : fs::directory_iterator(root / "exports"))
-        wholeFiles.push_back(entry.path());
+        CutFile(entry.path());
     for (int i = 2; i < argc; ++i)
         for (const fs::directory_entry& entry : fs::recursive_directory_iterator(argv[i]))
             if (entry.is_regular_file())
-                wholeFiles.push_back(entry.path());
-    for (const fs::path& file : wholeFiles)
-        CutFile(file);
+                CutFile(entry.path());
     std::printf("%d seeds in %s\n", written, argv[1]);
     return 0;
 }

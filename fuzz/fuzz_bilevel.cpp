@@ -1,6 +1,5 @@
-// The bi-level (CCITT T.4) decoder on one image's data. Input: a 5-byte
-// control prefix (bytes 0-1 and 2-3: NCOLS and NROWS less one; byte 4:
-// bit 0 one-dimensional coding), then the strip.
+// The bi-level (CCITT T.4) decoder on one image's data. Input: a 5-byte control prefix (bytes 0-1 and 2-3: NCOLS and
+// NROWS less one; byte 4: bit 0 one-dimensional coding), then the strip.
 #include "FuzzFile.h"
 #include "imaging/LeadToolLibWrapper.h"
 
@@ -8,14 +7,10 @@
 #include <stdexcept>
 #include <vector>
 
-namespace {
-
 constexpr size_t kPrefixSize = 5;
 constexpr uint32_t kSideMask = 0x1FFF; // images of up to 8192 x 8192
 constexpr uint64_t kPixelBudget = 1u << 20;
 constexpr uint32_t kByteBits = 8;
-
-} // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size)
 {

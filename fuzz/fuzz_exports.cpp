@@ -1,6 +1,5 @@
-// The whole export sequence on one input file, as a host drives it: probe,
-// open, one draw over the full width, every row up to a pixel budget, end of
-// draw, close. The exports are linked in, not loaded.
+// The whole export sequence on one input file, as a host drives it: probe, open, one draw over the full width, every
+// row up to a pixel budget, end of draw, close. The exports are linked in, not loaded.
 #include "FuzzFile.h"
 #include "plugin/HostRecords.h"
 
@@ -16,17 +15,13 @@ int32_t RH_EndDraw(RHHandle* handle);
 int32_t RH_Close(RHHandle* handle);
 }
 
-namespace {
-
 constexpr uint64_t kPixelBudget = 1u << 18; // pixels drawn per input
-constexpr uint32_t kMaxRows = 4096;
+constexpr uint32_t kMaxRows = 4096, kReverseRows = 64;
 constexpr uint32_t kFailedOpenSide = 64; // the span drawn on a handle whose open failed
-constexpr uint32_t kReverseRows = 64;
 
-// Rows firstRow, firstRow + step, ... of columns [firstColumn, endColumn),
-// while the pixel budget lasts.
-void DrawSpan(RHHandle& handle, int32_t firstColumn, int32_t endColumn, uint32_t firstRow, uint32_t height,
-              int32_t step)
+// Rows firstRow, firstRow + step, ... of columns [firstColumn, endColumn), while the pixel budget lasts.
+static void DrawSpan(RHHandle& handle, int32_t firstColumn, int32_t endColumn, uint32_t firstRow, uint32_t height,
+                     int32_t step)
 {
     const int32_t rect[4] = {firstColumn, int32_t(firstRow), endColumn, int32_t(std::min<uint32_t>(height, INT32_MAX))};
     uint32_t rowWidth = 0;
@@ -49,7 +44,7 @@ void DrawSpan(RHHandle& handle, int32_t firstColumn, int32_t endColumn, uint32_t
 
 // The full width from the top, then an inner span from the bottom row up
 // (hosts ask for rows in any order), then a span that starts left of the image.
-void Draw(RHHandle& handle)
+static void Draw(RHHandle& handle)
 {
     const bool described = handle.status == kStatusOk;
     const uint32_t width = described ? handle.width : kFailedOpenSide;
@@ -57,14 +52,10 @@ void Draw(RHHandle& handle)
     if (width > uint32_t(INT32_MAX) || height == 0)
         return;
     const auto end = int32_t(width);
-    DrawSpan(handle, 0, end, 0, height, 1);
-    if (handle.handler != nullptr)
-        DrawSpan(handle, end / 3, end - end / 5, height - 1, std::min<uint32_t>(height, kReverseRows), -1);
-    if (handle.handler != nullptr)
-        DrawSpan(handle, -3, std::min(end, 5), 0, 1, 1);
+    DrawSpan(handle, 0, end, 0, height, 1); // a draw that detached the handler leaves the next ones to fail
+    DrawSpan(handle, end / 3, end - end / 5, height - 1, std::min<uint32_t>(height, kReverseRows), -1);
+    DrawSpan(handle, -3, std::min(end, 5), 0, 1, 1);
 }
-
-} // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size)
 {
@@ -79,14 +70,11 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size)
     RH_Open(&handle, path);
     if (handle.handler == nullptr)
         return 0;
-    if (handle.palette != nullptr && handle.palette->entryCount > 0) {
-        volatile uint8_t last = handle.palette->entries[size_t(handle.palette->entryCount) * 3 - 1];
-        (void)last;
-    }
-    // A host may draw a handle whose open failed but left the handler
-    // attached (status 5): that must fail cleanly too.
+    volatile uint8_t last = 0; // the whole palette must be addressable
+    if (handle.palette != nullptr && handle.palette->entryCount > 0)
+        last = last ^ handle.palette->entries[size_t(handle.palette->entryCount) * 3 - 1];
+    // A host may draw a handle whose open failed but left the handler attached (status 5): that must fail cleanly too.
     Draw(handle);
-    if (handle.handler != nullptr)
-        RH_Close(&handle);
+    RH_Close(&handle);
     return 0;
 }

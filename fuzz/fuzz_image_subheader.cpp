@@ -1,20 +1,16 @@
-// The first image segment of a plain NITF file: subheader parse, data
-// preparation, decode of compressed kinds and rows up to a pixel budget.
-// Input: a 4-byte control prefix (byte 0: bit 0 NITF 2.1 layout, bit 1 not
-// used; bytes 1-3: LISH, 0 when not known), then the
-// subheader and its image data as they stand in the file.
+// The first image segment of a plain NITF file: subheader parse, data preparation, decode of compressed kinds and
+// rows up to a pixel budget. Input: a 4-byte control prefix (byte 0: bit 0 NITF 2.1 layout, bit 1 not used; bytes
+// 1-3: LISH, 0 when not known), then the subheader and its image data as they stand in the file.
 #include "FuzzFile.h"
 #include "nitf/NitfImage.h"
 
 #include <algorithm>
 #include <vector>
 
-namespace {
-
 constexpr size_t kPrefixSize = 4;
 constexpr uint64_t kPixelBudget = 1u << 18;
 
-void ReadRows(CNitfImage& image, CFileReader& reader)
+static void ReadRows(CNitfImage& image, CFileReader& reader)
 {
     if (image.NCOLS < 1 || image.NROWS < 1)
         return;
@@ -30,8 +26,6 @@ void ReadRows(CNitfImage& image, CFileReader& reader)
         image.ReadLine(reader, uint32_t(image.NROWS - 1), image.NCOLS - int32_t(width) + 1, image.NCOLS - 2,
                        row.data());
 }
-
-} // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size)
 {

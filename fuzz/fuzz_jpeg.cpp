@@ -1,8 +1,7 @@
-// The NITF JPEG decoder on one image's data. Input: an 8-byte control prefix
-// (byte 0: bit 0 three bands; byte 1: bit 0 two blocks per row, bit 1 two
-// per column; bytes 2-3 and 4-5: NPPBH and NPPBV less one; byte 6: bit 0
-// pass the block size, bit 1 the IC "C5" lossless kind, no other
-// difference here), then the image data: one JPEG stream per block.
+// The NITF JPEG decoder on one image's data. Input: an 8-byte control prefix (byte 0: bit 0 three bands; byte 1: bit
+// 0 two blocks per row, bit 1 two per column; bytes 2-3 and 4-5: NPPBH and NPPBV less one; byte 6: bit 0 pass the
+// block size, bit 1 the IC "C5" lossless kind, no other difference here), then the image data: one JPEG stream per
+// block.
 #include "FuzzFile.h"
 #include "imaging/LeadToolLibWrapper.h"
 
@@ -10,13 +9,9 @@
 #include <stdexcept>
 #include <vector>
 
-namespace {
-
 constexpr size_t kPrefixSize = 8;
 constexpr uint32_t kBlockSideMask = 0x7FF; // blocks of up to 2048 x 2048
 constexpr uint64_t kPixelBudget = 1u << 18;
-
-} // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size)
 {

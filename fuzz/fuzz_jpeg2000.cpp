@@ -1,19 +1,14 @@
-// The JPEG 2000 reader on one image's data. Input: a 6-byte control prefix
-// (bytes 0-1 and 2-3: NCOLS and NROWS less one; byte 4: bit 0 three bands
-// drawn as R, G, B; byte 5: NBPP less one, of which the low 4 bits), then
-// the image data: a codestream or a JP2 file.
+// The JPEG 2000 reader on one image's data. Input: a 6-byte control prefix (bytes 0-1 and 2-3: NCOLS and NROWS less
+// one; byte 4: bit 0 three bands drawn as R, G, B; byte 5: NBPP less one, of which the low 4 bits), then the image
+// data: a codestream or a JP2 file.
 #include "FuzzFile.h"
 #include "imaging/Jpeg2000Image.h"
 
 #include <algorithm>
 #include <vector>
 
-namespace {
-
 constexpr size_t kPrefixSize = 6;
 constexpr uint64_t kPixelBudget = 1u << 20;
-
-} // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size)
 {

@@ -1,6 +1,5 @@
-// The RPF frame reader on one input file: open at the RPFHDR data (found by
-// its tag, else at offset 0), then a full-width draw over a sample of rows
-// and a narrow draw inside the frame.
+// The RPF frame reader on one input file: open at the RPFHDR data (found by its tag, else at offset 0), then a
+// full-width draw over a sample of rows and a narrow draw inside the frame.
 #include "FuzzFile.h"
 #include "rpf/RpfFrameReader.h"
 
@@ -8,13 +7,11 @@
 #include <cstring>
 #include <vector>
 
-namespace {
-
 constexpr uint32_t kFrameSide = 1536;
 constexpr uint32_t kTagAndLength = 11; // CETAG (6) and CEL (5)
 constexpr size_t kTagSearch = 4096;
 
-uint32_t HeaderSectionOffset(const uint8_t* data, size_t size)
+static uint32_t HeaderSectionOffset(const uint8_t* data, size_t size)
 {
     const uint8_t* end = data + std::min(size, kTagSearch);
     static const char kTag[] = "RPFHDR";
@@ -22,7 +19,7 @@ uint32_t HeaderSectionOffset(const uint8_t* data, size_t size)
     return found == end ? 0 : uint32_t(found - data) + kTagAndLength;
 }
 
-void Draw(CRpfFrameReader& frame, CFileReader& reader, uint32_t first, uint32_t last, uint32_t rowStep)
+static void Draw(CRpfFrameReader& frame, CFileReader& reader, uint32_t first, uint32_t last, uint32_t rowStep)
 {
     std::vector<uint8_t> row(kFrameSide * 2);
     frame.PrepareDraw(last - first + 1);
@@ -30,8 +27,6 @@ void Draw(CRpfFrameReader& frame, CFileReader& reader, uint32_t first, uint32_t 
         frame.ReadLine(reader, r, first, last, row.data());
     frame.ReleaseCodeBuffer();
 }
-
-} // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size)
 {

@@ -1,8 +1,6 @@
-// Eight host threads on eight handles at once, through the loaded handler:
-// each opens, draws and closes its own files of every kind, many times. The
-// first opens are of compressed images, so they race to bind the imaging
-// library. Every draw must give what one thread alone gets. Run under
-// ThreadSanitizer by the test command (build-tsan).
+// Eight host threads on eight handles at once, through the loaded handler: each opens, draws and closes its own files
+// of every kind, many times. The first opens are of compressed images, so they race to bind the imaging library.
+// Every draw must give what one thread alone gets. Run under ThreadSanitizer by the test command (build-tsan).
 #include "tests/SampleFiles.h"
 #include "tests/fixtures/NitfFileWriter.h"
 #include "tests/fixtures/TempFiles.h"

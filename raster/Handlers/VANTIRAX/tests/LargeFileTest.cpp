@@ -5,34 +5,26 @@
 
 #include <gtest/gtest.h>
 
-namespace {
+#include <array>
 
-const HandlerExports& rh = LoadHandler(VX_HANDLER_PATH);
+namespace {
 
 TEST(LargeFile, RowsPastFourGigabytesComeFromTheirOwnOffsets)
 {
+    constexpr int32_t kSide = kLargeImageSide, kRows = kLargeImageRows;
     TempFile file;
     ASSERT_TRUE(WriteSparseLargeImage(file.path()));
-    OpenedImage image(rh, file.path());
+    OpenedImage image(LoadHandler(VX_HANDLER_PATH), file.path());
     ASSERT_TRUE(image.Ready()) << image.handle.status;
-    EXPECT_EQ(image.handle.width, uint32_t(kLargeImageSide));
-    EXPECT_EQ(image.handle.height, uint32_t(kLargeImageRows));
-    constexpr int32_t kSide = kLargeImageSide, kRows = kLargeImageRows;
-    struct Window {
-        int32_t x0, y0, x1, y1;
-    };
-    for (const Window& window : {Window{0, kRows - 2, kSide, kRows}, Window{kSide - 300, kRows - 1, kSide, kRows},
-                                 Window{0, kRows - 3, 16, kRows - 2}}) {
-        std::vector<uint8_t> pixels;
-        uint32_t failedRows = 0;
-        ASSERT_TRUE(image.Draw(window.x0, window.y0, window.x1, window.y1, pixels, failedRows));
-        EXPECT_EQ(failedRows, 0u);
-        const size_t width = size_t(window.x1 - window.x0);
-        for (int32_t row = window.y0; row < window.y1; ++row)
-            for (int32_t column = window.x0; column < window.x1; ++column)
-                ASSERT_EQ(pixels[size_t(row - window.y0) * width + size_t(column - window.x0)],
-                          row >= kRows - 2 ? LargeImagePixel(row, column) : 0)
-                    << "row " << row << " column " << column;
+    EXPECT_TRUE(image.handle.width == uint32_t(kSide) && image.handle.height == uint32_t(kRows));
+    for (const auto& [x0, y0, x1, y1] : {std::array<int32_t, 4>{0, kRows - 2, kSide, kRows},
+                                         {kSide - 300, kRows - 1, kSide, kRows}, {0, kRows - 3, 16, kRows - 2}}) {
+        ASSERT_TRUE(image.Draw(x0, y0, x1, y1));
+        EXPECT_EQ(image.failedRows, 0u);
+        for (int32_t row = y0; row < y1; ++row)
+            for (int32_t column = x0; column < x1; ++column)
+                ASSERT_EQ(image.pixels[size_t(row - y0) * size_t(x1 - x0) + size_t(column - x0)],
+                          LargeImagePixel(row, column)) << "row " << row << " column " << column;
     }
 }
 

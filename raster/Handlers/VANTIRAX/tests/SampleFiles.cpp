@@ -7,38 +7,21 @@
 #include "tests/fixtures/RpfFrameWriter.h"
 
 #include <fcntl.h>
-#include <malloc.h>
-#include <unistd.h>
 #include <map>
-
-// Defined by the sanitizer runtimes only (gcc ships no header for it).
-extern "C" size_t __sanitizer_get_current_allocated_bytes() __attribute__((weak));
+#include <unistd.h>
 
 namespace {
 
 constexpr uint32_t kFaxWidth = 96, kFaxHeight = 48;
 const char kUtmCorners[] = "335000004000000335060004000000335060003992000335000003992000"; // zone 33 north
 
-std::string AsString(const Bytes& bytes)
-{
-    return std::string(bytes.begin(), bytes.end());
-}
-
 // 70 x 90 pixels in 3 x 3 blocks of 32, the edge blocks padded; three bands are R, G, B.
 NitfImagePlan Image(const std::string& IREP, size_t bands, char IMODE, char ICORDS = ' ', const char* IGEOLO = "")
 {
-    NitfImagePlan plan;
-    plan.rows = 70;
-    plan.columns = 90;
-    plan.IREP = IREP;
-    plan.IMODE = IMODE;
-    plan.ICORDS = ICORDS;
-    plan.IGEOLO = IGEOLO;
-    plan.bands.assign(bands, NitfBandPlan{});
+    NitfImagePlan plan{true, false, 70, 90, "INT", IREP, 0, 'R', ICORDS, IGEOLO, {}, "NC", "",
+                       std::vector<NitfBandPlan>(bands), false, IMODE, 3, 3, 32, 32, 8, "", "", ""};
     for (size_t band = 0; bands == 3 && band < 3; ++band)
         plan.bands[band].IREPBAND = std::string(1, "RGB"[band]);
-    plan.NBPR = plan.NBPC = 3;
-    plan.NPPBH = plan.NPPBV = 32;
     return plan;
 }
 
@@ -49,25 +32,15 @@ std::string Uncompressed(const NitfImagePlan& plan, unsigned seed)
     const std::vector<std::string> blocks = BuildImageBlocks(plan, [&](int32_t band, int32_t row, int32_t column) {
         return (uint64_t(band * 70 + row * 3 + column * 5) + seed * 11) * (values > 256 ? 29 : 1) % values;
     });
-    std::vector<bool> stored(blocks.size());
-    for (size_t i = 0; i < stored.size(); ++i)
-        stored[i] = i % 4 != 1;
+    std::vector<bool> stored;
+    for (size_t i = 0; i < blocks.size(); ++i)
+        stored.push_back(i % 4 != 1);
     return BuildImageFile(plan, plan.IC == "NM" ? BuildMaskedData(blocks, stored, 8) : JoinBlocks(blocks),
                           plan.downgradeEvent);
 }
 
-std::string Frame(RpfProduct product, bool bigEndian, std::set<uint32_t> masked)
-{
-    RpfFramePlan plan;
-    plan.product = product;
-    plan.bigEndian = bigEndian;
-    plan.maskedSubframes = std::move(masked);
-    return BuildRpfFrame(plan).bytes;
-}
-
-// A 32 x 32 grey or colour image of 2 x 2 blocks; streamScale > 1 makes each
-// stream that many times larger than its block, the lower two progressive
-// (their coefficient buffers are as large as the frame).
+// A 32 x 32 grey or colour image of 2 x 2 blocks; streamScale > 1 makes each stream that many times larger than its
+// block, the lower two progressive (their coefficient buffers are as large as the frame).
 std::string Jpeg(int components, unsigned seed, uint32_t streamScale = 1)
 {
     const bool grey = components == 1;
@@ -85,7 +58,8 @@ std::string Jpeg(int components, unsigned seed, uint32_t streamScale = 1)
                                                           : TestPattern(16, 16, components, seed * 4 + i),
                                           block));
     }
-    return BuildImageFile(plan, AsString(BuildNitfJpegData(streams, NitfApp6Plan{2, 2, 0, uint8_t(grey ? 0 : 2)})));
+    const Bytes data = BuildNitfJpegData(streams, NitfApp6Plan{2, 2, 0, uint8_t(grey ? 0 : 2)});
+    return BuildImageFile(plan, std::string(data.begin(), data.end()));
 }
 
 // JPEG 2000 in 32 x 32 tiles, the subheader's blocks: 12-bit grey samples
@@ -109,7 +83,9 @@ std::string BiLevel(bool twoDimensional, unsigned seed)
     std::vector<uint8_t> packed(size_t(kFaxWidth / 8) * kFaxHeight);
     for (size_t i = 0; i < packed.size(); ++i)
         packed[i] = uint8_t((i * 37 + seed * 11) ^ (i / 12));
-    return BuildImageFile(BiLevelPlan(int32_t(kFaxWidth), int32_t(kFaxHeight), twoDimensional), AsString(EncodeT4Strip(packed, kFaxWidth, kFaxHeight, twoDimensional)));
+    const std::vector<uint8_t> strip = EncodeT4Strip(packed, kFaxWidth, kFaxHeight, twoDimensional);
+    return BuildImageFile(BiLevelPlan(int32_t(kFaxWidth), int32_t(kFaxHeight), twoDimensional),
+                          std::string(strip.begin(), strip.end()));
 }
 
 } // namespace
@@ -136,9 +112,9 @@ std::vector<SampleFile> FilesOfEveryKind(unsigned seed)
         {"compressed_jpeg2000_rgb_jp2", Jpeg2000(true, seed)},
         {"compressed_bilevel_1d", BiLevel(false, seed)},
         {"compressed_bilevel_2d", BiLevel(true, seed)},
-        {"cadrg_big_endian", Frame(RpfProduct::Cadrg, true, cadrgMasked)},
-        {"cadrg_little_endian", Frame(RpfProduct::Cadrg, false, cadrgMasked)},
-        {"cib", Frame(RpfProduct::Cib, true, {7})},
+        {"cadrg_big_endian", BuildRpfFrame({RpfProduct::Cadrg, true, {}, cadrgMasked, {}, {}}).bytes},
+        {"cadrg_little_endian", BuildRpfFrame({RpfProduct::Cadrg, false, {}, cadrgMasked, {}, {}}).bytes},
+        {"cib", BuildRpfFrame({RpfProduct::Cib, true, {}, {7}, {}, {}}).bytes},
         {"mono_geographic",
          Uncompressed(Image("MONO", 1, 'B', 'G', "324530N0784510W324530N0784400W324415N0784400W324415N0784510W"),
                       seed)},
@@ -154,12 +130,9 @@ std::vector<SampleFile> FilesOfEveryKind(unsigned seed)
 
 std::vector<SampleFile> HostileFiles()
 {
-    RpfFramePlan shortTable;
-    shortTable.indexImage = std::vector<uint8_t>(kRpfFrameSide * kRpfFrameSide, 3);
-    shortTable.colorTableRecords = {32};
-    NitfFilePlan noSections; // RPFHDR present, the RPF sections missing
-    noSections.images.push_back({std::string(100, 'x'), std::string(100, 'y')});
-    noSections.userHeaderData = Tre("RPFHDR", std::string(48, '\0'));
+    const RpfFramePlan shortTable{RpfProduct::Cadrg, true, Bytes(kRpfFrameSide * kRpfFrameSide, 3), {}, {}, {32}};
+    const NitfFilePlan noSections{true, false, {{std::string(100, 'x'), std::string(100, 'y')}}, {}, {}, {}, {}, {},
+                                  Tre("RPFHDR", std::string(48, '\0')), "", -1, -1}; // the RPF sections missing
     NitfImagePlan plan;
     plan.rows = plan.columns = 8;
     plan.COMRAT = "00.0";
@@ -170,12 +143,10 @@ std::vector<SampleFile> HostileFiles()
     const std::string dpcm = withIC("C2", 64), jpeg2000 = withIC("C8", 64), cut = withIC("NC", 64).substr(0, 300);
     plan.PVTYPE = "R";
     plan.NBPP = 32;
+    // dpcm parses but is never served; jpeg2000 parses but holds no codestream.
     return {{"rpf_short_colour_table", BuildRpfFrame(shortTable).bytes},
-            {"rpf_sections_missing", BuildNitfFile(noSections)},
-            {"dpcm", dpcm}, // parses, never served
-            {"jpeg2000", jpeg2000}, // parses; no codestream
-            {"real_pixels", withIC("NC", 256)},
-            {"cut_header", cut},
+            {"rpf_sections_missing", BuildNitfFile(noSections)}, {"dpcm", dpcm}, {"jpeg2000", jpeg2000},
+            {"real_pixels", withIC("NC", 256)}, {"cut_header", cut},
             {"jpeg_streams_larger_than_blocks", Jpeg(1, 0, 16)}};
 }
 
@@ -193,47 +164,39 @@ std::string OpenDrawClose(const HandlerExports& rh, const std::string& path, uin
 {
     OpenedImage image(rh, path);
     const RHHandle& h = image.handle;
-    std::vector<uint8_t> pixels;
-    uint32_t failedRows = 0;
-    if (image.Ready() && !image.Draw(0, 0, int32_t(h.width), int32_t(std::min(h.height, maxRows)), pixels, failedRows))
-        failedRows = UINT32_MAX;
-    std::string drawn = "result " + std::to_string(image.result) + " status " + std::to_string(h.status) + " failed " +
-        std::to_string(failedRows) + " size " + std::to_string(h.width) + " x " + std::to_string(h.height) + " kind " +
-        std::to_string(h.pixelKind) + "\n";
+    if (image.Ready() && !image.Draw(0, 0, int32_t(h.width), int32_t(std::min(h.height, maxRows))))
+        image.failedRows = UINT32_MAX;
+    std::string drawn = "result " + std::to_string(image.result) + " status " + std::to_string(h.status) +
+        " failed " + std::to_string(image.failedRows) + " size " + std::to_string(h.width) + " x " +
+        std::to_string(h.height) + " kind " + std::to_string(h.pixelKind) + "\n";
     if (h.palette != nullptr)
         drawn.append(reinterpret_cast<const char*>(h.palette->entries), size_t(h.palette->entryCount) * 3);
-    return drawn.append(pixels.begin(), pixels.end());
+    return drawn.append(image.pixels.begin(), image.pixels.end());
 }
 
 uint8_t LargeImagePixel(int32_t row, int32_t column)
 {
-    return uint8_t(row * 7 + column);
+    return row >= kLargeImageRows - 2 ? uint8_t(row * 7 + column) : 0;
 }
 
 bool WriteSparseLargeImage(const std::string& path)
 {
     constexpr size_t kFlOffset = 342, kLiOffset = 369; // FL (12 digits) and LI (10) of a NITF 2.1 file
+    constexpr int32_t kSide = kLargeImageSide, kRows = kLargeImageRows;
     NitfImagePlan plan;
-    plan.rows = kLargeImageRows;
-    plan.columns = plan.NPPBH = plan.NPPBV = kLargeImageSide;
-    plan.NBPC = kLargeImageRows / kLargeImageSide;
-    std::string header = BuildImageFile(plan, "");
-    const uint64_t dataBytes = uint64_t(kLargeImageSide) * uint64_t(kLargeImageRows);
+    plan.rows = kRows;
+    plan.columns = plan.NPPBH = plan.NPPBV = kSide;
+    plan.NBPC = kRows / kSide;
+    std::string header = BuildImageFile(plan, ""), lastRows;
+    const uint64_t dataBytes = uint64_t(kSide) * uint64_t(kRows);
     header.replace(kFlOffset, 12, Digits(header.size() + dataBytes, 12));
     header.replace(kLiOffset, 10, Digits(dataBytes, 10));
-    std::string lastRows;
-    for (int32_t row = kLargeImageRows - 2; row < kLargeImageRows; ++row)
-        for (int32_t column = 0; column < kLargeImageSide; ++column)
-            lastRows.push_back(char(LargeImagePixel(row, column)));
+    for (int32_t at = 0; at < 2 * kSide; ++at)
+        lastRows.push_back(char(LargeImagePixel(kRows - 2 + at / kSide, at % kSide)));
     const int file = ::open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
     const off_t end = off_t(header.size() + dataBytes);
     const bool written = file >= 0 && ::pwrite(file, header.data(), header.size(), 0) == ssize_t(header.size()) &&
                          ::pwrite(file, lastRows.data(), lastRows.size(), end - off_t(lastRows.size())) ==
                              ssize_t(lastRows.size());
     return (file < 0 || ::close(file) == 0) && written;
-}
-
-size_t HeapInUse()
-{
-    return __sanitizer_get_current_allocated_bytes ? __sanitizer_get_current_allocated_bytes() : mallinfo2().uordblks;
 }

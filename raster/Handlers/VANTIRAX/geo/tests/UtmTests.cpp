@@ -107,9 +107,8 @@ TEST(Mgrs, ConvertsOrRefusesEachReference)
         // band check allows that much at precision 0, not at precision 5.
         {"31NDK", {0, 31, 'N', 400000, 900000}}, {"31NDK0000000000", {kMgrsRejected, 31, 'N', 400000, 900000}},
     };
-    // Malformed, or of squares that do not exist: zones 32, 34 and 36 do not
-    // reach band X, polar bands have no zone, square letters must be of the
-    // zone's set (zone 31: A-H, 32: J-R, 33: S-Z; rows A-V). No position.
+    // Malformed, or of squares that do not exist: zones 32, 34 and 36 do not reach band X, polar bands have no zone,
+    // square letters must be of the zone's set (zone 31: A-H, 32: J-R, 33: S-Z; rows A-V). No position.
     for (const char* refused : {"00UDQ", "61UDQ", "UDQ12", "131UDQ", "31UD12", "31UDQQ12", "31IDQ", "31UDO",
                                 "31UDQ123456789", "31UDQ12345678901", "31UDQ123456789012", "31U DQ 52482 11717", "",
                                 "31", "32XNG", "34XNG", "36XNG", "31ADQ", "31BDQ", "31YDQ", "31ZDQ", "31UJQ", "32UHQ",
@@ -174,9 +173,8 @@ TEST(Utm, HemispheresGridLimitsAndTheInverse)
     EXPECT_EQ(UtmToGeodetic(0, 'X', 500000.0, -1.0, kA, kB, latitude, longitude),
               kUtmZoneError | kUtmHemisphereError | kUtmNorthingError);
     EXPECT_EQ(latitude, kUnset);
-    // No sound inverse: Svalbard's zone 33 requested down to 32 (10.5 degrees from its meridian),
-    // and a point the series carries many turns past the pole, where the inverse must still end,
-    // folded back.
+    // No sound inverse: Svalbard's zone 33 requested down to 32 (10.5 degrees from its meridian), and a point the
+    // series carries many turns past the pole, where the inverse must still end, folded back.
     const Grid far = ToUtm(80.0, 19.5, 32);
     EXPECT_EQ(UtmToGeodetic(32, 'N', std::get<3>(far), std::get<4>(far), kA, kB, latitude, longitude),
               kUtmNorthingError);

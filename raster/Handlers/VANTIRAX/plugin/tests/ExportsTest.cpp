@@ -14,20 +14,15 @@ namespace {
 const HandlerExports& rh = LoadHandler(VX_HANDLER_PATH);
 constexpr uint32_t kHostStatus = 77; // a value the library never writes
 
-RHHandle FreshHandle()
-{
-    RHHandle handle{};
-    handle.status = kHostStatus;
-    return handle;
-}
+const auto FreshHandle = [] { RHHandle handle{}; handle.status = kHostStatus; return handle; };
 
 // The names and the extension list are compared by HostCommandsTest ("identify").
 TEST(Exports, IdentityRecordIsCopiedWhole)
 {
     RHIdentity identity;
-    std::fill_n(reinterpret_cast<uint8_t*>(&identity), sizeof identity, 0xEE);
+    auto* bytes = reinterpret_cast<uint8_t*>(&identity);
+    std::fill_n(bytes, sizeof identity, 0xEE);
     EXPECT_TRUE(rh.identify(&identity) == 1 && identity.version == 3 && identity.extensionCount == 1);
-    const auto* bytes = reinterpret_cast<const uint8_t*>(&identity);
     EXPECT_EQ(size_t(std::count(bytes + 1031, bytes + sizeof identity, 0)), sizeof identity - 1031);
 }
 

@@ -12,10 +12,8 @@
 
 namespace {
 
-bool Parses(const std::string& bytes, CNitfFileHeader* parsed = nullptr)
+bool Parses(const std::string& bytes, CNitfFileHeader& header)
 {
-    CNitfFileHeader local;
-    CNitfFileHeader& header = parsed ? *parsed : local;
     const TempFile file(bytes, ".ntf");
     header.SetPath(file.c_str());
     return header.Parse();
@@ -78,7 +76,7 @@ TEST(NitfFileHeader, SegmentGroupsOfBothVersionsAndTheRpfHeader)
                                 Tre("XTRA01", "xyz"), -1, -1};
         const std::string bytes = BuildNitfFile(plan);
         CNitfFileHeader h;
-        ASSERT_TRUE(Parses(bytes, &h)) << c.version21 << c.event;
+        ASSERT_TRUE(Parses(bytes, h)) << c.version21 << c.event;
         EXPECT_EQ(std::vector<int64_t>({h.version21, h.fixedLayout, h.HL, h.NUMI, h.NUMS, h.NUML, h.NUMT, h.NUMDES,
                                         h.NUMRES, h.UDHDL, h.XHDL, h.HasRpfHeader()}),
                   std::vector<int64_t>({c.version21, c.event && !c.version21 ? 0 : 1, NitfHeaderLength(plan), 2, 1, 1,
@@ -90,7 +88,7 @@ TEST(NitfFileHeader, SegmentGroupsOfBothVersionsAndTheRpfHeader)
         EXPECT_EQ(std::string(reinterpret_cast<char*>(h.XHD), 6), "XTRA01");
     }
     CNitfFileHeader none; // no segments at all still parses
-    ASSERT_TRUE(Parses(BuildNitfFile(NitfFilePlan{}), &none));
+    ASSERT_TRUE(Parses(BuildNitfFile(NitfFilePlan{}), none));
     EXPECT_TRUE(none.NUMI == 0 && none.imageSegments == nullptr && none.userHeaderOffset == kNoUserHeader);
 }
 
@@ -103,9 +101,8 @@ TEST(NitfFileHeader, RefusesWrongVersionsAndLengthsThatLie)
     const std::string good = declaring(-1, -1), rest = good.substr(9);
     const Refusal kVersion = Refusal::kNotNitf, kLength = Refusal::kFileLengthMismatch,
                   kField = Refusal::kHeaderFieldInvalid;
-    // Other versions; FL larger or smaller than the file; a segment count running past the end
-    // of the file whose FL still matches, or not a number; UDHDL of 1 or 2 (a negative data
-    // size) or past the end of the file; XHDL 2.
+    // Other versions; FL larger or smaller than the file; a segment count running past the end of the file whose FL
+    // still matches, or not a number; UDHDL of 1 or 2 (a negative data size) or past the end of the file; XHDL 2.
     for (const auto& [bad, why] : std::initializer_list<std::pair<std::string, Refusal>>{
              {"NITF02.01" + rest, kVersion}, {"NITF01.10" + rest, kVersion}, {"NSIF01.01" + rest, kVersion},
              {"NITF03.00" + rest, kVersion}, {good.substr(0, good.size() - 1), kLength}, {good + "x", kLength},
@@ -113,7 +110,7 @@ TEST(NitfFileHeader, RefusesWrongVersionsAndLengthsThatLie)
              {good.substr(0, 360) + "-1x" + good.substr(363), kField}, {declaring(1, -1), kField},
              {declaring(2, -1), kField}, {declaring(99999, -1), kField}, {declaring(-1, 2), kField}}) {
         CNitfFileHeader header;
-        EXPECT_FALSE(Parses(bad, &header)) << bad.substr(0, 9) << " " << bad.size();
+        EXPECT_FALSE(Parses(bad, header)) << bad.substr(0, 9) << " " << bad.size();
         EXPECT_EQ(header.refusal, why) << bad.substr(0, 9) << " " << bad.size();
     }
 }

@@ -165,8 +165,8 @@ TEST(RpfBadInput, RefusedAtOpenOrOnlyTheLinesTheDamageMeets)
     std::vector<uint8_t> line(kRpfFrameSide + 1);
     for (uint32_t drawWidth : {uint32_t(INT32_MAX), UINT32_MAX}) {
         reader.PrepareDraw(drawWidth);
-        EXPECT_EQ(reader.codeBuffer.size(), kRpfFrameSide / 4 + 2) << drawWidth;
-        EXPECT_TRUE(reader.ReadLine(whole.drawReader, 9, 3, 700, line.data())) << drawWidth;
+        EXPECT_TRUE(reader.codeBuffer.size() == kRpfFrameSide / 4 + 2 &&
+                    reader.ReadLine(whole.drawReader, 9, 3, 700, line.data())) << drawWidth;
     }
     reader.PrepareDraw(8);
     EXPECT_FALSE(reader.ReadLine(whole.drawReader, 0, 0, 100, line.data()));
