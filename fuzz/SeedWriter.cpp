@@ -45,9 +45,8 @@ void JpegStreams()
 {
     for (int components : {1, 3})
         for (int n = 1; n <= 7; ++n) { // lossless: predictor n, point transform n % 3; baseline: quality n
-            const JpegBlockPlan lossless{16, 16, components, false, 0, true, true, true, false, false, n, n % 3,
-                                         n % 2 ? 4u : 0u};
-            const JpegBlockPlan baseline{16, 16, components, false, n <= 5 ? n : 0, n > 5, n > 5};
+            const JpegBlockPlan lossless{16, 16, components, false, n, n % 3, n % 2 ? 4u : 0u};
+            const JpegBlockPlan baseline{16, 16, components, false, 0, 0, 0, n <= 5 ? n : 0, n > 5, n > 5};
             const Bytes pattern = TestPattern(16, 16, components, unsigned(n));
             for (const Bytes& stream : {EncodeJpegBlock(pattern, lossless), EncodeJpegBlock(pattern, baseline)}) {
                 const Bytes data = BuildNitfJpegData({stream}, NitfApp6Plan{});
