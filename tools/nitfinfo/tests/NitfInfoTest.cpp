@@ -1,5 +1,5 @@
-// nitfinfo run as a user runs it: the fields it prints of fixture and real
-// files against what GDAL reads of them, and its exit codes and messages.
+// nitfinfo run as a user runs it: the fields it prints of fixture and real files against what GDAL reads of them, and
+// its exit codes and messages.
 #include "tests/GdalPeer.h"
 #include "tests/SampleFiles.h"
 #include "tests/fixtures/Command.h"
@@ -13,21 +13,17 @@
 #include <algorithm>
 #include <map>
 #include <regex>
-#include <set>
 #include <sys/wait.h>
 
 namespace {
 
-struct Outcome {
-    int exitCode;
-    std::string out, err;
-};
+struct Outcome { int exitCode; std::string out, err; };
 
 Outcome RunInfo(const std::string& arguments)
 {
     TempFile err(".err");
     int status = -1;
-    std::string out = RunCommand("(" VX_NITFINFO_PATH " " + arguments + " 2>" + err.path() + ")", &status);
+    const std::string out = RunCommand("(" VX_NITFINFO_PATH " " + arguments + " 2>" + err.path() + ")", &status);
     return {WIFEXITED(status) ? WEXITSTATUS(status) : -1, out, ReadWholeFile(err.path())};
 }
 
@@ -41,8 +37,8 @@ std::map<std::string, std::string> Matches(const std::string& text, const std::s
     return found;
 }
 
-// What gdalinfo -mdd TRE says: every "  KEY=value" line (NITF_ fields, subdatasets), the size, the band
-// count and the TRE section.
+// What gdalinfo -mdd TRE says: every "  KEY=value" line (NITF_ fields, subdatasets), the size, the band count and the
+// TRE section.
 std::map<std::string, std::string> GdalFields(const std::string& path)
 {
     const std::string text = RunCommand("gdalinfo -mdd TRE '" + path + "'");
@@ -63,11 +59,8 @@ std::string Ours(const std::string& json, const std::string& name)
     return match[2].matched ? match[2].str() : match[1].str();
 }
 
-struct InfoCase {
-    const char* sample;   // fixture file written under this name, or null
-    const char* location; // the name of a fixture file, the corpus path of a real file
-    bool served;
-};
+// A sample written as a fixture file named `location`, or none and `location` is a real file's corpus path.
+struct InfoCase { const char *sample, *location; bool served; };
 const InfoCase kCases[] = {
     {"mono_geographic", "mono.ntf", true},         {"rgb_band_sequential_mgrs_20", "rgb20.ntf", true}, // TRE in UDID
     {"compressed_jpeg_grey", "jpeg.ntf", true},    {"cadrg_big_endian", "00001011.ON1", true},
@@ -96,8 +89,8 @@ TEST(NitfInfo, FieldsAgreeWithGdal)
                                        "IMODE", "PVTYPE", "ICORDS", "IGEOLO"})
             EXPECT_EQ(Ours(run.out, name), gdal.count("NITF_" + name) ? gdal["NITF_" + name] : "-") << name;
         EXPECT_EQ(std::stoi(Ours(run.out, "ABPP")), std::stoi(gdal["NITF_ABPP"]));
-        EXPECT_EQ(Ours(run.out, "NCOLS") + "x" + Ours(run.out, "NROWS"), gdal["size"]);
-        EXPECT_EQ(Ours(run.out, "NBANDS"), gdal["bands"]);
+        EXPECT_EQ(Ours(run.out, "NCOLS") + "x" + Ours(run.out, "NROWS") + ", " + Ours(run.out, "NBANDS") + " bands",
+                  gdal["size"] + ", " + gdal["bands"] + " bands");
         EXPECT_EQ(std::stoi(Ours(run.out, "NUMI")), gdal.count("SUBDATASET_2_NAME") ? 2 : 1);
         EXPECT_EQ(Ours(run.out, "served"), row.served ? "true" : "false");
         // GDAL's TREs include those of the file header and DES.
@@ -116,16 +109,13 @@ TEST(NitfInfo, ExitCodesMessagesAndUntrustedText)
 {
     TempDirectory folder;
     const std::string good = folder / "good.ntf", text = folder / "text.ntf", odd = folder / "odd.ntf";
-    WriteFile(good, SampleBytes("mono_geographic"));
-    WriteFile(text, std::string(400, 'x'));
     std::string bytes = SampleBytes("mono_geographic");
+    WriteFile(good, bytes), WriteFile(text, std::string(400, 'x'));
     WriteFile(odd, bytes.replace(39, 6, "\x01\"\\\t\x7f\xff")); // FTITLE "fixture" begins with these
     const std::string aridpcm = folder / "c2.ntf", real = folder / "real.ntf"; // described, not served
-    NitfImagePlan plan;
-    plan.IC = "C2", plan.COMRAT = "00.0";
-    WriteFile(aridpcm, BuildImageFile(plan, "x"));
-    plan = NitfImagePlan{}, plan.PVTYPE = "R", plan.NBPP = 32;
-    WriteFile(real, BuildImageFile(plan, "1234"));
+    NitfImagePlan c2, real32;
+    c2.IC = "C2", c2.COMRAT = "00.0", real32.PVTYPE = "R", real32.NBPP = 32;
+    WriteFile(aridpcm, BuildImageFile(c2, "x")), WriteFile(real, BuildImageFile(real32, "1234"));
     // errLines: one per refused file; -1 for the usage.
     const struct { std::string arguments; int exitCode; long errLines; std::string inOut, inErr; } cases[] = {
         {"--help", 0, 0, "usage: nitfinfo", ""},
