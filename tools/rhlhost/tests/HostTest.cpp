@@ -190,8 +190,9 @@ const Command kCommands[] = {
     {{"render", "-o", "IN/frame.ntf/out", "IN"}, 1, {"cannot create IN/frame.ntf/out"}},
     {{"render", "--format", "png", "-o", "OUT", "IN/gone.ntf", "IN/utm.ntf"}, 1,
      {"IN/gone.ntf: the file no longer exists", "2 files: 1 rendered"}, {"utm.ntf.png"}},
-    {{"render", "--jobs", "2", "-o", "OUT", "IN"}, 1,
+    {{"render", "--jobs", "2", "-v", "-o", "OUT", "IN"}, 1,
      {"IN/broken.ntf: the handler could not open it (result 0, status 5): not a file this handler reads; nitfinfo",
+      "IN/notes.txt: not a file this handler reads (left out)",
       "IN/rows_fail.ntf: 32 rows could not be decoded (written as zeros)",
       "310 files: 7 rendered (1 with 32 undecodable rows), 303 refused (302 not recognised, 1 not opened, 0 vanished), "
       "0 failed to write"},
